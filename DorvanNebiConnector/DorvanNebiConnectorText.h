@@ -1,0 +1,20 @@
+#pragma once
+
+// Text helpers shared by the connector's sources. Internal: not installed
+// with the public headers.
+
+#include <wx/string.h>
+
+#include <string>
+
+namespace DorvanNebiConnectorUtil
+{
+// The text as UTF-8 bytes.
+std::string ToUtf8(const wxString& text);
+
+// The JSON text with the value of every member whose name ends in "key",
+// "secret", "sceret" or "token" (in any letter case) replaced by "***", so
+// that credentials never reach a log line. Works on any text, also on broken
+// or truncated JSON: whatever looks like such a member is masked.
+std::string MaskSecrets(const std::string& text);
+} // namespace DorvanNebiConnectorUtil

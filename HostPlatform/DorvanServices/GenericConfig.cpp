@@ -1,0 +1,160 @@
+#include <DorvanServices/GenericConfig.h>
+
+#include <CoreServices/GlobalUtils.h>
+#include <CoreServices/Logger.h>
+
+#include <boost/property_tree/json_parser.hpp>
+#include <wx/datetime.h>
+#include <wx/file.h>
+#include <wx/filefn.h>
+#include <wx/log.h>
+
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+
+namespace
+{
+const char* const kSource = "HostPlatform/DorvanServices/GenericConfig";
+
+bool ReadWholeFile(const wxString& path, std::string& content)
+{
+    std::ifstream file(GlobalUtils::ToFileSystemPath(path), std::ios::in | std::ios::binary);
+    if (!file.is_open())
+    {
+        return false;
+    }
+    std::ostringstream buffer;
+    buffer << file.rdbuf();
+    content = buffer.str();
+    return !file.bad();
+}
+
+bool IsBlank(const std::string& text)
+{
+    return text.find_first_not_of(" \t\r\n") == std::string::npos;
+}
+
+// A configuration file holds one JSON object. The JSON reader also accepts an
+// array or a bare value, which would come back as children without names or
+// as data on the root; neither is a configuration.
+bool IsObject(const boost::property_tree::ptree& root)
+{
+    if (!root.data().empty())
+    {
+        return false;
+    }
+    for (const auto& child : root)
+    {
+        if (child.first.empty())
+        {
+            return false;
+        }
+    }
+    return true;
+}
+
+// Writes content to a new file beside path and then renames it over path, so
+// that the file at path always holds either its old or its new content in
+// whole, whatever happens in between. The rename replaces an existing file.
+bool ReplaceFileAtomically(const wxString& path, const std::string& content)
+{
+    wxLogNull quiet;
+    const wxString temporaryPath = path + ".tmp-" + GlobalUtils::GetUUID().Left(8);
+    wxFile file;
+    if (!file.Create(temporaryPath, false, wxS_DEFAULT))
+    {
+        return false;
+    }
+    const bool written = file.Write(content.data(), content.size()) == content.size() && file.Flush();
+    const bool closed = file.Close();
+    std::error_code error;
+    if (written && closed)
+    {
+        std::filesystem::rename(GlobalUtils::ToFileSystemPath(temporaryPath), GlobalUtils::ToFileSystemPath(path),
+                                error);
+        if (!error)
+        {
+            return true;
+        }
+    }
+    std::filesystem::remove(GlobalUtils::ToFileSystemPath(temporaryPath), error);
+    return false;
+}
+} // namespace
+
+GenericConfig::GenericConfig(const wxString& path) : m_path(path)
+{
+    LoadConfig();
+}
+
+GenericConfig::~GenericConfig() = default;
+
+void GenericConfig::LoadConfig()
+{
+    std::string content;
+    if (!ReadWholeFile(m_path, content) || IsBlank(content))
+    {
+        return; // no file, or an empty one: every read gives its default
+    }
+    try
+    {
+        std::istringstream stream(content);
+        boost::property_tree::ptree tree;
+        boost::property_tree::read_json(stream, tree);
+        if (IsObject(tree))
+        {
+            m_tree.swap(tree);
+            return;
+        }
+    }
+    catch (const std::exception&)
+    {
+    }
+    m_unreadableFileToKeep = true;
+    SetLevelAndGetLogger(SeverityError, kSource, "GenericConfig::GenericConfig", __LINE__)
+        << "the configuration file " << m_path.utf8_string()
+        << " is not a JSON object; defaults apply and the file is kept aside before it is next written";
+}
+
+bool GenericConfig::KeepUnreadableFile()
+{
+    const wxString copyPath = m_path + ".unreadable-" + wxDateTime::Now().Format("%Y%m%dT%H%M%S");
+    wxLogNull quiet;
+    if (!wxCopyFile(m_path, copyPath, false))
+    {
+        SetLevelAndGetLogger(SeverityError, kSource, "GenericConfig::SaveConfig", __LINE__)
+            << "cannot keep a copy of the unreadable configuration file " << m_path.utf8_string()
+            << "; it is left as it is and the new values are not saved";
+        return false;
+    }
+    SetLevelAndGetLogger(SeverityError, kSource, "GenericConfig::SaveConfig", __LINE__)
+        << "the unreadable configuration file " << m_path.utf8_string() << " was kept as "
+        << copyPath.utf8_string();
+    m_unreadableFileToKeep = false;
+    return true;
+}
+
+void GenericConfig::SaveConfig(const wxString& path)
+{
+    if (m_unreadableFileToKeep && path == m_path && !KeepUnreadableFile())
+    {
+        return;
+    }
+    std::ostringstream text;
+    try
+    {
+        boost::property_tree::write_json(text, m_tree);
+    }
+    catch (const std::exception& e)
+    {
+        SetLevelAndGetLogger(SeverityError, kSource, "GenericConfig::SaveConfig", __LINE__)
+            << "cannot write the configuration " << path.utf8_string() << ", message " << e.what();
+        return;
+    }
+    if (!ReplaceFileAtomically(path, text.str()))
+    {
+        SetLevelAndGetLogger(SeverityError, kSource, "GenericConfig::SaveConfig", __LINE__)
+            << "cannot save the configuration file " << path.utf8_string() << "; it keeps its old content";
+    }
+}

@@ -1,0 +1,22 @@
+# Warnings and sanitizers for the project's own targets.
+# Third-party headers come in through imported targets and are therefore
+# system headers: their warnings do not count against ours.
+
+function(dorvan_nebi_target_options target)
+    target_compile_options(${target} PRIVATE -Wall -Wextra -Wpedantic)
+    if(DORVAN_NEBI_WERROR)
+        target_compile_options(${target} PRIVATE -Werror)
+    endif()
+endfunction()
+
+if(DORVAN_NEBI_SANITIZER STREQUAL "address")
+    set(_flags -fsanitize=address,undefined -fno-sanitize-recover=undefined -fno-omit-frame-pointer)
+elseif(DORVAN_NEBI_SANITIZER STREQUAL "thread")
+    set(_flags -fsanitize=thread -fno-omit-frame-pointer)
+elseif(NOT DORVAN_NEBI_SANITIZER STREQUAL "")
+    message(FATAL_ERROR "DORVAN_NEBI_SANITIZER must be empty, 'address' or 'thread'")
+endif()
+if(_flags)
+    add_compile_options(${_flags})
+    add_link_options(${_flags})
+endif()

@@ -1,0 +1,24 @@
+# Finds what the connector and its host platform libraries are built on.
+# Included by the project itself and, once installed, by DorvanNebiConnectorConfig.cmake.
+include(CMakeFindDependencyMacro)
+
+find_dependency(Threads)
+find_dependency(Boost 1.74 COMPONENTS system)
+find_dependency(Poco COMPONENTS Foundation Net NetSSL Crypto)
+find_dependency(jsoncpp)
+
+# wxWidgets' find module defines variables, not a target: wrap the base
+# library (and nothing of the GUI) into one imported target.
+if(NOT TARGET DorvanNebi::wxBase)
+    find_package(wxWidgets 3.2 REQUIRED COMPONENTS base)
+    add_library(DorvanNebi::wxBase INTERFACE IMPORTED)
+    set_target_properties(DorvanNebi::wxBase PROPERTIES
+        INTERFACE_INCLUDE_DIRECTORIES "${wxWidgets_INCLUDE_DIRS}"
+        INTERFACE_COMPILE_DEFINITIONS "${wxWidgets_DEFINITIONS}"
+        INTERFACE_LINK_LIBRARIES "${wxWidgets_LIBRARIES}")
+    if(wxWidgets_CXX_FLAGS)
+        separate_arguments(_dorvan_wx_flags UNIX_COMMAND "${wxWidgets_CXX_FLAGS}")
+        list(FILTER _dorvan_wx_flags EXCLUDE REGEX "^-I")
+        set_property(TARGET DorvanNebi::wxBase PROPERTY INTERFACE_COMPILE_OPTIONS "${_dorvan_wx_flags}")
+    endif()
+endif()

@@ -17,6 +17,9 @@ elseif(NOT DORVAN_NEBI_SANITIZER STREQUAL "")
     message(FATAL_ERROR "DORVAN_NEBI_SANITIZER must be empty, 'address' or 'thread'")
 endif()
 if(_flags)
+    # The sanitizers' instrumentation makes GCC see uninitialised values in
+    # the standard library where there are none.
+    list(APPEND _flags -Wno-maybe-uninitialized)
     add_compile_options(${_flags})
     add_link_options(${_flags})
 endif()

@@ -12,9 +12,11 @@ find_dependency(jsoncpp)
 if(NOT TARGET DorvanNebi::wxBase)
     find_package(wxWidgets 3.2 REQUIRED COMPONENTS base)
     add_library(DorvanNebi::wxBase INTERFACE IMPORTED)
+    # The find module leaves out wx-config's wxUSE_GUI=0, without which the
+    # headers declare the GUI library's classes.
     set_target_properties(DorvanNebi::wxBase PROPERTIES
         INTERFACE_INCLUDE_DIRECTORIES "${wxWidgets_INCLUDE_DIRS}"
-        INTERFACE_COMPILE_DEFINITIONS "${wxWidgets_DEFINITIONS}"
+        INTERFACE_COMPILE_DEFINITIONS "${wxWidgets_DEFINITIONS};wxUSE_GUI=0"
         INTERFACE_LINK_LIBRARIES "${wxWidgets_LIBRARIES}")
     if(wxWidgets_CXX_FLAGS)
         separate_arguments(_dorvan_wx_flags UNIX_COMMAND "${wxWidgets_CXX_FLAGS}")

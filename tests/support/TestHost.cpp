@@ -21,6 +21,9 @@ namespace TestSupport
 namespace
 {
 wxString g_sandbox;
+// One event loop for the whole process, active from start to end: workers
+// wake it up from their threads, so it must never go away under them.
+wxEventLoopBase* g_loop = nullptr;
 
 wxString Join(const wxString& directory, const wxString& name)
 {
@@ -75,6 +78,8 @@ void StartTestHost(int argc, char** argv)
         throw std::runtime_error("the test host's application object did not start");
     }
     Logging::SetLogFile(Join(g_sandbox, "test.log"));
+    g_loop = wxTheApp->GetTraits()->CreateEventLoop();
+    wxEventLoopBase::SetActive(g_loop);
 }
 
 void StopTestHost()
@@ -107,8 +112,6 @@ void WriteCloudConfig(const std::string& json)
 bool RunEventLoopUntil(const std::function<bool()>& condition, std::chrono::milliseconds timeout)
 {
     const auto deadline = std::chrono::steady_clock::now() + timeout;
-    std::unique_ptr<wxEventLoopBase> loop(wxTheApp->GetTraits()->CreateEventLoop());
-    wxEventLoopActivator activate(loop.get());
     for (;;)
     {
         wxTheApp->ProcessPendingEvents();
@@ -124,7 +127,7 @@ bool RunEventLoopUntil(const std::function<bool()>& condition, std::chrono::mill
         // Sleeps until a worker queues an event (which wakes the loop up) or
         // a short while has passed.
         const auto wait = std::min(std::chrono::duration_cast<std::chrono::milliseconds>(deadline - now), 20ms);
-        loop->DispatchTimeout(static_cast<unsigned long>(wait.count()));
+        g_loop->DispatchTimeout(static_cast<unsigned long>(wait.count()));
     }
 }
 

@@ -56,6 +56,11 @@ TEST(GenericConfig, MissingEmptyOrUnreadableFilesGiveDefaults)
         EXPECT_EQ(config.GetValue<std::string>("nebiprotocol", "https"), "https") << content;
         EXPECT_EQ(config.GetValue<wxString>("time", ""), "") << content;
     }
+    // Valid JSON, but far too large for a configuration: not even read.
+    WriteFile(ConfigPath(), "{\"quarlport\": \"9000\", \"pad\": \"" + std::string(5 * 1024 * 1024, 'x') + "\"}");
+    EXPECT_EQ(GenericConfig(ConfigPath()).GetValue<unsigned short>("quarlport", 7285), 7285);
+    EXPECT_EQ(CountLogLines("is too large to be a configuration"), 1u);
+
     GenericConfig missing(ConfigPath("missing.json"));
     EXPECT_EQ(missing.GetValue<std::string>("nebidomain", "default.example"), "default.example");
     // Reading writes nothing.

@@ -17,17 +17,35 @@ namespace
 {
 const char* const kSource = "HostPlatform/DorvanServices/GenericConfig";
 
-bool ReadWholeFile(const wxString& path, std::string& content)
+// A configuration holds a handful of keys; a file far larger than that is
+// not one, and is not read into memory.
+constexpr std::uintmax_t kMaxConfigFileSize = 4 * 1024 * 1024;
+
+enum class FileRead
 {
-    std::ifstream file(GlobalUtils::ToFileSystemPath(path), std::ios::in | std::ios::binary);
+    Missing,
+    TooLarge,
+    Read
+};
+
+FileRead ReadWholeFile(const wxString& path, std::string& content)
+{
+    const std::filesystem::path fsPath = GlobalUtils::ToFileSystemPath(path);
+    std::error_code error;
+    const std::uintmax_t size = std::filesystem::file_size(fsPath, error);
+    if (!error && size > kMaxConfigFileSize)
+    {
+        return FileRead::TooLarge;
+    }
+    std::ifstream file(fsPath, std::ios::in | std::ios::binary);
     if (!file.is_open())
     {
-        return false;
+        return FileRead::Missing;
     }
     std::ostringstream buffer;
     buffer << file.rdbuf();
     content = buffer.str();
-    return !file.bad();
+    return FileRead::Read;
 }
 
 bool IsBlank(const std::string& text)
@@ -52,6 +70,25 @@ bool IsObject(const boost::property_tree::ptree& root)
         }
     }
     return true;
+}
+
+bool ParseObject(const std::string& content, boost::property_tree::ptree& tree)
+{
+    try
+    {
+        std::istringstream stream(content);
+        boost::property_tree::ptree parsed;
+        boost::property_tree::read_json(stream, parsed);
+        if (IsObject(parsed))
+        {
+            tree.swap(parsed);
+            return true;
+        }
+    }
+    catch (const std::exception&)
+    {
+    }
+    return false;
 }
 
 // Writes content to a new file beside path and then renames it over path, so
@@ -93,28 +130,32 @@ GenericConfig::~GenericConfig() = default;
 void GenericConfig::LoadConfig()
 {
     std::string content;
-    if (!ReadWholeFile(m_path, content) || IsBlank(content))
+    switch (ReadWholeFile(m_path, content))
     {
-        return; // no file, or an empty one: every read gives its default
+    case FileRead::Missing:
+        return; // every read gives its default
+    case FileRead::TooLarge:
+        MarkUnreadable("is too large to be a configuration");
+        return;
+    case FileRead::Read:
+        break;
     }
-    try
+    if (IsBlank(content))
     {
-        std::istringstream stream(content);
-        boost::property_tree::ptree tree;
-        boost::property_tree::read_json(stream, tree);
-        if (IsObject(tree))
-        {
-            m_tree.swap(tree);
-            return;
-        }
+        return;
     }
-    catch (const std::exception&)
+    if (!ParseObject(content, m_tree))
     {
+        MarkUnreadable("is not a JSON object");
     }
+}
+
+void GenericConfig::MarkUnreadable(const char* reason)
+{
     m_unreadableFileToKeep = true;
     SetLevelAndGetLogger(SeverityError, kSource, "GenericConfig::GenericConfig", __LINE__)
-        << "the configuration file " << m_path.utf8_string()
-        << " is not a JSON object; defaults apply and the file is kept aside before it is next written";
+        << "the configuration file " << m_path.utf8_string() << " " << reason
+        << "; defaults apply and the file is kept aside before it is next written";
 }
 
 bool GenericConfig::KeepUnreadableFile()

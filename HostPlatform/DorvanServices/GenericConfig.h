@@ -150,6 +150,7 @@ private:
     }
 
     void LoadConfig();
+    void MarkUnreadable(const char* reason);
     void SaveConfig(const wxString& path);
     bool KeepUnreadableFile();
 

@@ -2,6 +2,7 @@
 
 #include <DorvanNebiConnector/BackupRestoreComponent.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorConstants.h>
+#include <DorvanNebiConnector/DorvanNebiConnectorThreads.h>
 #include <DorvanNebiConnector/DorvanNebiLoginComponent.h>
 #include <DorvanNebiConnector/DorvanNebiServicesComponent.h>
 
@@ -12,6 +13,7 @@
 #include <wx/filename.h>
 #include <wx/stdpaths.h>
 
+#include <cstdlib>
 #include <mutex>
 
 namespace
@@ -68,6 +70,9 @@ DorvanNebiConnector* DorvanNebiConnector::GetInstance()
     {
         instance = new DorvanNebiConnector();
         m_pInstance.store(instance, std::memory_order_release);
+        // Registered now, after the host has set up what the jobs use, so
+        // that it runs before those things are torn down at exit.
+        std::atexit(&DorvanNebiConnectorUtil::OnProcessExit);
     }
     return instance;
 }

@@ -7,35 +7,102 @@
 #include <boost/asio/post.hpp>
 #include <wx/app.h>
 
+#include <condition_variable>
 #include <exception>
+#include <mutex>
 #include <utility>
+
+namespace
+{
+// How long an exiting process waits for jobs that are running.
+constexpr std::chrono::seconds kExitGracePeriod(2);
+
+// The jobs running now, and whether the process is exiting. Never destroyed:
+// workers may still look at it while the process ends.
+struct WorkState
+{
+    std::mutex mutex;
+    std::condition_variable changed;
+    int running = 0;
+    bool exiting = false;
+};
+
+WorkState& State()
+{
+    static WorkState* state = new WorkState();
+    return *state;
+}
+
+bool BeginJob()
+{
+    WorkState& state = State();
+    std::lock_guard<std::mutex> lock(state.mutex);
+    if (state.exiting)
+    {
+        return false;
+    }
+    ++state.running;
+    return true;
+}
+
+void EndJob()
+{
+    WorkState& state = State();
+    {
+        std::lock_guard<std::mutex> lock(state.mutex);
+        --state.running;
+    }
+    state.changed.notify_all();
+}
+
+bool IsExiting()
+{
+    WorkState& state = State();
+    std::lock_guard<std::mutex> lock(state.mutex);
+    return state.exiting;
+}
+
+void RunGuarded(const std::function<void()>& job)
+{
+    try
+    {
+        job();
+    }
+    catch (const std::exception& e)
+    {
+        SetLevelAndGetLogger(SeverityError, DorvanNebiConstants::kLogSourceConnector,
+                             "DorvanNebiConnectorUtil::PostJob", __LINE__)
+            << "a job ended with an exception, message " << e.what();
+    }
+    catch (...)
+    {
+        SetLevelAndGetLogger(SeverityError, DorvanNebiConstants::kLogSourceConnector,
+                             "DorvanNebiConnectorUtil::PostJob", __LINE__)
+            << "a job ended with an unknown exception";
+    }
+}
+} // namespace
 
 namespace DorvanNebiConnectorUtil
 {
 void PostJob(boost::asio::thread_pool* pool, std::function<void()> job)
 {
     boost::asio::post(*pool, [job = std::move(job)]() {
-        try
+        if (!BeginJob())
         {
-            job();
+            return;
         }
-        catch (const std::exception& e)
-        {
-            SetLevelAndGetLogger(SeverityError, DorvanNebiConstants::kLogSourceConnector,
-                                 "DorvanNebiConnectorUtil::PostJob", __LINE__)
-                << "a job ended with an exception, message " << e.what();
-        }
-        catch (...)
-        {
-            SetLevelAndGetLogger(SeverityError, DorvanNebiConstants::kLogSourceConnector,
-                                 "DorvanNebiConnectorUtil::PostJob", __LINE__)
-                << "a job ended with an unknown exception";
-        }
+        RunGuarded(job);
+        EndJob();
     });
 }
 
 void PostToGuiThread(std::function<void()> closure)
 {
+    if (IsExiting())
+    {
+        return;
+    }
     wxAppConsole* const app = wxTheApp;
     if (!app)
     {
@@ -47,5 +114,26 @@ void PostToGuiThread(std::function<void()> closure)
     // CallAfter queues the closure with the application's thread-safe
     // QueueEvent; the host's event loop runs it on the GUI thread.
     app->CallAfter(std::move(closure));
+}
+
+bool PauseUnlessExiting(std::chrono::milliseconds duration)
+{
+    WorkState& state = State();
+    std::unique_lock<std::mutex> lock(state.mutex);
+    return !state.changed.wait_for(lock, duration, [&state] { return state.exiting; });
+}
+
+void OnProcessExit()
+{
+    WorkState& state = State();
+    std::unique_lock<std::mutex> lock(state.mutex);
+    state.exiting = true;
+    state.changed.notify_all();
+#ifndef _WIN32
+    // On Windows the other threads have already been ended when a library's
+    // exit handlers run; elsewhere they are still running and about to lose
+    // the libraries under their feet.
+    state.changed.wait_for(lock, kExitGracePeriod, [&state] { return state.running == 0; });
+#endif
 }
 } // namespace DorvanNebiConnectorUtil

@@ -10,7 +10,6 @@
 #include <CoreServices/Logger.h>
 
 #include <chrono>
-#include <thread>
 
 using namespace DorvanNebiConstants;
 
@@ -19,7 +18,7 @@ namespace
 // The start-up query gives the agent, which may still be starting, this many
 // chances, one second apart.
 constexpr int kStartupAttempts = 4;
-constexpr std::chrono::seconds kStartupRetryDelay(1);
+constexpr std::chrono::milliseconds kStartupRetryDelay(1000);
 
 // "nebilogin response parsing failed, HTTP response {...}", with any
 // credentials in the body masked.
@@ -125,11 +124,10 @@ void DorvanNebiLoginComponent::QueryLoginState()
         const bool answered = DoRefreshLoginState();
         SetLevelAndGetLogger(SeverityInfo, kLogSourceLogin, "DorvanNebiLoginComponent::QueryLoginState", __LINE__)
             << " Initial login Retry attempt: " << attempt;
-        if (answered)
+        if (answered || !DorvanNebiConnectorUtil::PauseUnlessExiting(kStartupRetryDelay))
         {
             return;
         }
-        std::this_thread::sleep_for(kStartupRetryDelay);
     }
 }
 

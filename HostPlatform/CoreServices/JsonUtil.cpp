@@ -19,10 +19,12 @@ Json::CharReaderBuilder MakeReaderBuilder()
     return builder;
 }
 
+// The builders below are made once and never destroyed: workers may still be
+// parsing while the process exits.
 bool ParseDocument(const char* begin, const char* end, Json::Value& root)
 {
-    static const Json::CharReaderBuilder builder = MakeReaderBuilder();
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+    static const Json::CharReaderBuilder* const builder = new Json::CharReaderBuilder(MakeReaderBuilder());
+    const std::unique_ptr<Json::CharReader> reader(builder->newCharReader());
     std::string errors;
     try
     {
@@ -36,13 +38,13 @@ bool ParseDocument(const char* begin, const char* end, Json::Value& root)
 
 wxString CompactText(const Json::Value& value)
 {
-    static const Json::StreamWriterBuilder builder = [] {
-        Json::StreamWriterBuilder b;
-        b["indentation"] = "";
-        b["emitUTF8"] = true;
+    static const Json::StreamWriterBuilder* const builder = [] {
+        auto* b = new Json::StreamWriterBuilder();
+        (*b)["indentation"] = "";
+        (*b)["emitUTF8"] = true;
         return b;
     }();
-    return wxString::FromUTF8(Json::writeString(builder, value));
+    return wxString::FromUTF8(Json::writeString(*builder, value));
 }
 } // namespace
 

@@ -3,7 +3,8 @@
 include(CMakeFindDependencyMacro)
 
 find_dependency(Threads)
-find_dependency(Boost 1.74 COMPONENTS system)
+# Asio, Signals2, PropertyTree and System are header-only.
+find_dependency(Boost 1.74)
 find_dependency(Poco COMPONENTS Foundation Net NetSSL Crypto)
 find_dependency(jsoncpp)
 

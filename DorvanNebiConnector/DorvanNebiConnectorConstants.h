@@ -95,6 +95,7 @@ inline constexpr char kFieldDescription[] = "description";
 inline constexpr char kFieldKeywords[] = "keywords";
 inline constexpr char kFieldResourceName[] = "resourcename";
 inline constexpr char kFilePartName[] = "file";
+inline constexpr char kFilePartMediaType[] = "application/octet-stream";
 inline constexpr char kAppName[] = "dorvan";
 inline constexpr char kKeywords[] = "dorvan";
 
@@ -110,6 +111,22 @@ inline constexpr std::size_t kBodyCopyBufferSize = 8192;
 inline constexpr std::size_t kDownloadBlockSize = 2048;
 inline constexpr std::size_t kDownloadFileNameLength = 8;
 inline constexpr char kDownloadFileExtension[] = ".zip";
+// A download is written under a name of its own beside the final one and
+// renamed only once it is complete.
+inline constexpr char kPartialDownloadExtension[] = ".part";
+// Fresh names tried before a download gives up for want of a free file name.
+inline constexpr int kDownloadNameAttempts = 16;
+// Limits on the framing lines of a chunked body (chunk sizes and trailer
+// fields), so that a broken answer cannot make the reader collect without end.
+inline constexpr std::size_t kChunkLineMaxLength = 4096;
+inline constexpr std::size_t kChunkTrailerMaxLength = 65536;
+
+// Cloud sessions wait as long as the HTTP library does by default; with POCO
+// 1.11 that is 30 s for the connection and 60 s for each send and each
+// receive. They are set explicitly so that they stay so with any library
+// version.
+inline constexpr long kCloudConnectTimeoutSeconds = 30;
+inline constexpr long kCloudSendReceiveTimeoutSeconds = 60;
 
 // Source paths named in log lines.
 inline constexpr char kLogSourceConnector[] = "DorvanNebiConnector/DorvanNebiConnector";

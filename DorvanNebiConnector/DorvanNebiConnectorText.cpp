@@ -125,6 +125,12 @@ std::string NormalisedName(const std::string& quoted)
     return name;
 }
 
+bool IsUnreservedInPath(unsigned char c)
+{
+    return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == '-' || c == '_' ||
+           c == '.' || c == '~';
+}
+
 bool IsSecretName(const std::string& quoted)
 {
     const std::string name = NormalisedName(quoted);
@@ -173,5 +179,31 @@ std::string MaskSecrets(const std::string& text)
         }
     }
     return masked;
+}
+
+std::string EncodePathSegment(const std::string& bytes)
+{
+    if (bytes.empty() || bytes == "." || bytes == "..")
+    {
+        return std::string();
+    }
+    static const char kHexDigits[] = "0123456789ABCDEF";
+    std::string encoded;
+    encoded.reserve(bytes.size());
+    for (const char c : bytes)
+    {
+        const unsigned char byte = static_cast<unsigned char>(c);
+        if (IsUnreservedInPath(byte))
+        {
+            encoded += c;
+        }
+        else
+        {
+            encoded += '%';
+            encoded += kHexDigits[byte >> 4];
+            encoded += kHexDigits[byte & 0x0F];
+        }
+    }
+    return encoded;
 }
 } // namespace DorvanNebiConnectorUtil

@@ -1,0 +1,39 @@
+// quarl-agent-sim: a stand-in of the local agent, for demonstrations and tests.
+// See AgentRequestHandler.h for what it answers and --help for its options.
+
+#include "AgentApplication.h"
+
+#include <Poco/AutoPtr.h>
+#include <Poco/ConsoleChannel.h>
+#include <Poco/FormattingChannel.h>
+#include <Poco/Logger.h>
+#include <Poco/PatternFormatter.h>
+#include <Poco/Util/OptionException.h>
+
+#include <exception>
+#include <iostream>
+
+int main(int argc, char** argv)
+{
+    try
+    {
+        AgentApplication application;
+        // Until the application sets up its own console lines, its messages
+        // go to stderr under the program's name.
+        Poco::AutoPtr<Poco::ConsoleChannel> console(new Poco::ConsoleChannel(std::cerr));
+        Poco::AutoPtr<Poco::PatternFormatter> format(new Poco::PatternFormatter("quarl-agent-sim: %t"));
+        application.logger().setChannel(new Poco::FormattingChannel(format, console));
+        application.init(argc, argv); // reads the options
+        return application.run();
+    }
+    catch (const Poco::Util::OptionException& e)
+    {
+        std::cerr << "quarl-agent-sim: " << e.displayText() << " (see --help)" << std::endl;
+        return Poco::Util::Application::EXIT_USAGE;
+    }
+    catch (const std::exception& e)
+    {
+        std::cerr << "quarl-agent-sim: " << e.what() << std::endl;
+    }
+    return Poco::Util::Application::EXIT_SOFTWARE;
+}

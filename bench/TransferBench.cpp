@@ -1,7 +1,8 @@
 // Moves one archive of a given size up to and back down from an HTTPS server
-// on the loopback address, first with the connector's upload and download
-// clients, then with curl, and reports the time and the peak resident memory
-// of each. The archive streams from and to disk on both sides, so memory
+// on the loopback address, first through the connector (a private backup and
+// its restore, as a host makes them), then with curl, and reports the time,
+// the throughput and the peak resident memory of each, and how the two
+// compare. The archive streams from and to disk on both sides, so memory
 // should stay flat whatever the size.
 //
 //     transfer_bench [SIZE]      SIZE in bytes, or with K, M or G (default 1G)
@@ -16,8 +17,8 @@
 #include "TestHost.h"
 #include "TestTls.h"
 
-#include <DorvanNebiConnector/DorvanNebiHTTPSGetClientForDownload.h>
-#include <DorvanNebiConnector/DorvanNebiHTTPSPostRestClient.h>
+#include <DorvanNebiConnector/BackupRestoreComponent.h>
+#include <DorvanNebiConnector/DorvanNebiConnector.h>
 
 #include <CoreServices/GlobalUtils.h>
 #include <CoreServices/Logger.h>
@@ -25,6 +26,7 @@
 #include <Poco/Net/HTMLForm.h>
 #include <Poco/Net/MessageHeader.h>
 #include <Poco/Net/PartHandler.h>
+#include <Poco/URI.h>
 
 #include <spawn.h>
 #include <sys/wait.h>
@@ -33,6 +35,7 @@
 #include <cstdio>
 #include <cstring>
 #include <fstream>
+#include <functional>
 #include <iostream>
 #include <sstream>
 #include <stdexcept>
@@ -261,6 +264,29 @@ void Report(const char* name, const Figures& figures, std::uint64_t size)
     }
     std::printf("%s\n", figures.ok ? "" : "   FAILED");
 }
+
+void ReportRatio(const char* name, const Figures& connector, const Figures& curl)
+{
+    std::printf("%-20s connector at %.2f times curl's throughput\n", name, curl.seconds / connector.seconds);
+}
+
+// One request through the backup component, from the call to its final
+// status on this (the GUI) thread.
+template <typename Status>
+bool AwaitFinished(boost::signals2::signal<void(Status)>& signal, const std::function<wxString()>& start,
+                   Status& final)
+{
+    bool finished = false;
+    boost::signals2::scoped_connection connection = signal.connect([&](Status status) {
+        if (status.state == BackupRestoreComponent::Finished)
+        {
+            final = status;
+            finished = true;
+        }
+    });
+    return !start().empty() && RunEventLoopUntil([&] { return finished; }, std::chrono::hours(1)) &&
+           final.error == BackupRestoreComponent::NoError;
+}
 } // namespace
 
 int main(int argc, char** argv)
@@ -278,10 +304,12 @@ int main(int argc, char** argv)
     MakeArchive(source, size);
 
     LoopbackServer server(ServerTlsContext());
+    const std::string uploadPath = "/api/clientapp/v1/resource";
+    const std::string downloadPath = "/api/clientapp/v1/resource/dorvannebiuserpersonalsetting/";
     // The server stores an upload's body as it comes; the archive is taken
     // out of the form afterwards, outside the measured time.
     std::string uploadContentType;
-    server.RouteRaw("/upload", [&](Poco::Net::HTTPServerRequest& request, Poco::Net::HTTPServerResponse& response) {
+    server.RouteRaw(uploadPath, [&](Poco::Net::HTTPServerRequest& request, Poco::Net::HTTPServerResponse& response) {
         uploadContentType = request.getContentType();
         std::ofstream body(receivedBody, std::ios::binary | std::ios::trunc);
         CopyStream(request.stream(), body);
@@ -294,31 +322,40 @@ int main(int argc, char** argv)
         std::remove(received.c_str());
         return same;
     };
-    server.RouteRaw("/archive", [&](Poco::Net::HTTPServerRequest&, Poco::Net::HTTPServerResponse& response) {
+    server.RouteRaw(downloadPath, [&](Poco::Net::HTTPServerRequest&, Poco::Net::HTTPServerResponse& response) {
         response.sendFile(source, "application/zip");
     });
     const std::string base = "https://localhost:" + std::to_string(server.Port());
-    Poco::URI uploadUri(base + "/upload");
-    Poco::URI downloadUri(base + "/archive");
+    Poco::URI uploadUri(base + uploadPath);
+    Poco::URI downloadUri(base + downloadPath);
+
+    // The local agent hands out the credentials of every cloud request.
+    LoopbackServer agent;
+    agent.Route("/api/v1/nebilogin", Reply::Json(R"({"isLoginSuccess":"yes","apiKey":"k","apiSceret":"s"})"));
+    WriteCloudConfig("{\"quarlport\": \"" + std::to_string(agent.Port()) +
+                     "\", \"nebidomain\": \"localhost\", \"nebiport\": \"" + std::to_string(server.Port()) + "\"}");
+    DorvanNebiConnectorContext::InitializeDorvanNebiConnector();
+    BackupRestoreComponent& backups = *DorvanNebiConnector::GetInstance()->GetBackupRestoreComponent();
 
     std::printf("transfer of %llu bytes (%.2f MiB) over HTTPS on the loopback address\n",
                 static_cast<unsigned long long>(size), static_cast<double>(size) / kMiB);
     std::printf("process peak before the transfers: %.1f MiB\n", static_cast<double>(PeakRssKiB()) / 1024.0);
 
     Figures upload = Measure([&](Figures&) {
-        DorvanNebiHTTPSPostRestClient client(uploadUri, {}, {{"type", "bench"}}, wxString::FromUTF8(source));
-        return client.SendRequest() && client.m_response.getStatus() == 200;
+        BackupRestoreComponent::BackupStatus final;
+        return AwaitFinished<BackupRestoreComponent::BackupStatus>(
+            backups.m_sigBackupStatus,
+            [&] { return backups.BackupToPrivateSpace(wxString::FromUTF8(source), false); }, final);
     });
     upload.ok = upload.ok && uploadArrivedWhole();
     Report("connector upload", upload, size);
 
-    std::string downloaded;
+    BackupRestoreComponent::RestoreStatus restored;
     Figures download = Measure([&](Figures&) {
-        DorvanNebiHTTPSGetClientForDownload client(downloadUri, {});
-        const bool ok = client.SendRequest();
-        downloaded = client.m_downloadedFilePath.utf8_string();
-        return ok;
+        return AwaitFinished<BackupRestoreComponent::RestoreStatus>(
+            backups.m_sigRestoreStatus, [&] { return backups.RestoreFromPrivateSpace(); }, restored);
     });
+    const std::string downloaded = restored.filePath.utf8_string();
     download.ok = download.ok && SameContent(source, downloaded);
     Report("connector download", download, size);
     std::remove(downloaded.c_str());
@@ -335,7 +372,10 @@ int main(int argc, char** argv)
     });
     curlDownload.ok = curlDownload.ok && SameContent(source, curlDownloadFile);
     Report("curl download", curlDownload, size);
+    ReportRatio("upload", upload, curlUpload);
+    ReportRatio("download", download, curlDownload);
 
+    agent.Stop();
     server.Stop();
     StopTestHost();
     return upload.ok && download.ok && curlUpload.ok && curlDownload.ok ? 0 : 1;

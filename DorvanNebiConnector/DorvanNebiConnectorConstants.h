@@ -26,6 +26,8 @@ inline constexpr char kKeyNebiDomain[] = "nebidomain";
 inline constexpr char kDefaultNebiDomain[] = "api.nebi.dorvan.com";
 inline constexpr char kKeyNebiPort[] = "nebiport";
 inline constexpr unsigned short kDefaultNebiPort = 443;
+// The longest host name the cloud may have (a DNS name's limit).
+inline constexpr std::size_t kMaxHostNameLength = 253;
 inline constexpr char kKeyNebiApiVersion[] = "nebiclientappapiversion";
 inline constexpr char kDefaultNebiApiVersion[] = "/api/clientapp/v1";
 inline constexpr char kKeyLastPrivateBackupTime[] = "dorvannebilastprivatebackuptime";

@@ -67,6 +67,23 @@ TEST(GenericConfig, MissingEmptyOrUnreadableFilesGiveDefaults)
     EXPECT_FALSE(wxFileName::FileExists(ConfigPath("missing.json")));
 }
 
+// The JSON reader descends once per level on the caller's stack: nesting
+// beyond what a configuration needs is refused before it is parsed.
+TEST(GenericConfig, FilesNestingTooDeeplyGiveDefaults)
+{
+    auto nested = [](int depth) {
+        return "{\"quarlport\": \"9000\", \"a\": " + std::string(depth - 1, '[') + "\"[{\"" +
+               std::string(depth - 1, ']') + "}";
+    };
+    WriteFile(ConfigPath(), nested(64));
+    EXPECT_EQ(GenericConfig(ConfigPath()).GetValue<unsigned short>("quarlport", 7285), 9000);
+    WriteFile(ConfigPath(), nested(65));
+    EXPECT_EQ(GenericConfig(ConfigPath()).GetValue<unsigned short>("quarlport", 7285), 7285);
+    WriteFile(ConfigPath(), nested(1000000));
+    EXPECT_EQ(GenericConfig(ConfigPath()).GetValue<unsigned short>("quarlport", 7285), 7285);
+    EXPECT_EQ(CountLogLines("nests too deeply to be a configuration"), 2u);
+}
+
 TEST(GenericConfig, PortsAreSixteenBitDecimalNumbers)
 {
     EXPECT_EQ(PortFrom("0"), 0);

@@ -20,6 +20,11 @@ const char* const kSource = "HostPlatform/DorvanServices/GenericConfig";
 // A configuration holds a handful of keys; a file far larger than that is
 // not one, and is not read into memory.
 constexpr std::uintmax_t kMaxConfigFileSize = 4 * 1024 * 1024;
+// Nor does a configuration nest objects and arrays deeper than this. The JSON
+// reader of the property tree descends once per level on the stack of the
+// calling thread (the host's GUI thread at start-up), so a file of a few
+// hundred kilobytes of "[[[[..." would overflow it and end the host.
+constexpr int kMaxConfigNesting = 64;
 
 enum class FileRead
 {
@@ -70,6 +75,45 @@ bool IsObject(const boost::property_tree::ptree& root)
         }
     }
     return true;
+}
+
+// Whether objects and arrays in the JSON text nest deeper than the limit;
+// brackets inside strings do not count.
+bool NestsTooDeeply(const std::string& content)
+{
+    int depth = 0;
+    bool inString = false;
+    for (std::size_t i = 0; i < content.size(); ++i)
+    {
+        const char c = content[i];
+        if (inString)
+        {
+            if (c == '\\')
+            {
+                ++i;
+            }
+            else if (c == '"')
+            {
+                inString = false;
+            }
+        }
+        else if (c == '"')
+        {
+            inString = true;
+        }
+        else if (c == '{' || c == '[')
+        {
+            if (++depth > kMaxConfigNesting)
+            {
+                return true;
+            }
+        }
+        else if (c == '}' || c == ']')
+        {
+            --depth;
+        }
+    }
+    return false;
 }
 
 bool ParseObject(const std::string& content, boost::property_tree::ptree& tree)
@@ -142,6 +186,11 @@ void GenericConfig::LoadConfig()
     }
     if (IsBlank(content))
     {
+        return;
+    }
+    if (NestsTooDeeply(content))
+    {
+        MarkUnreadable("nests too deeply to be a configuration");
         return;
     }
     if (!ParseObject(content, m_tree))

@@ -77,11 +77,13 @@ Answer AskAgent(unsigned short port, const std::string& target, const std::strin
 std::string SendRaw(Poco::Net::StreamSocket& socket, const std::string& bytes)
 {
     socket.setReceiveTimeout(Poco::Timespan(20, 0));
-    socket.sendBytes(bytes.data(), static_cast<int>(bytes.size()));
     std::string answer;
     char buffer[1024];
     try
     {
+        // A server that refuses what it got may reset the connection while
+        // the bytes are still going out, too.
+        socket.sendBytes(bytes.data(), static_cast<int>(bytes.size()));
         for (int got; (got = socket.receiveBytes(buffer, sizeof(buffer))) > 0;)
         {
             answer.append(buffer, static_cast<std::size_t>(got));
@@ -89,7 +91,7 @@ std::string SendRaw(Poco::Net::StreamSocket& socket, const std::string& bytes)
     }
     catch (const Poco::Net::ConnectionResetException&)
     {
-        // The server closed at once after its answer.
+        // The server closed at once after its answer, or instead of one.
     }
     return answer;
 }

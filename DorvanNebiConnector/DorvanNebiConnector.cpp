@@ -9,6 +9,7 @@
 #include <CoreServices/GlobalUtils.h>
 #include <DorvanServices/GenericConfig.h>
 
+#include <Poco/Net/NetSSL.h>
 #include <boost/asio/thread_pool.hpp>
 #include <wx/filename.h>
 #include <wx/stdpaths.h>
@@ -70,8 +71,12 @@ DorvanNebiConnector* DorvanNebiConnector::GetInstance()
     {
         instance = new DorvanNebiConnector();
         m_pInstance.store(instance, std::memory_order_release);
-        // Registered now, after the host has set up what the jobs use, so
-        // that it runs before those things are torn down at exit.
+        // Exit handlers run last registered first. OpenSSL registers its own
+        // clean-up when it is first initialised, which a host may well do
+        // only after this (when it sets up TLS): initialised here, before the
+        // connector's handler is registered, it is torn down only after that
+        // handler has stopped the jobs that use it.
+        Poco::Net::initializeSSL();
         std::atexit(&DorvanNebiConnectorUtil::OnProcessExit);
     }
     return instance;

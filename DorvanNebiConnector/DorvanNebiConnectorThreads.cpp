@@ -4,12 +4,16 @@
 
 #include <CoreServices/Logger.h>
 
+#include <Poco/Exception.h>
+#include <Poco/Net/HTTPSession.h>
+#include <Poco/Net/SecureStreamSocketImpl.h>
 #include <boost/asio/post.hpp>
 #include <wx/app.h>
 
 #include <condition_variable>
 #include <exception>
 #include <mutex>
+#include <set>
 #include <utility>
 
 namespace
@@ -25,6 +29,8 @@ struct WorkState
     std::condition_variable changed;
     int running = 0;
     bool exiting = false;
+    // The sessions over which running jobs exchange with a peer now.
+    std::set<Poco::Net::HTTPSession*> sessions;
 };
 
 WorkState& State()
@@ -60,6 +66,30 @@ bool IsExiting()
     WorkState& state = State();
     std::lock_guard<std::mutex> lock(state.mutex);
     return state.exiting;
+}
+
+// Shuts the session's TCP connection down, which wakes its owner from any
+// wait on the peer; the owner's thread alone closes the socket and frees it.
+// For TLS only the TCP connection is shut down: the TLS state belongs to the
+// owner's thread.
+void CutConnection(Poco::Net::HTTPSession& session)
+{
+    try
+    {
+        Poco::Net::SocketImpl* const socket = session.socket().impl();
+        if (auto* secure = dynamic_cast<Poco::Net::SecureStreamSocketImpl*>(socket))
+        {
+            secure->abort();
+        }
+        else if (socket->initialized())
+        {
+            socket->shutdown();
+        }
+    }
+    catch (...)
+    {
+        // Not connected (yet, or any more): nothing to cut.
+    }
 }
 
 void RunGuarded(const std::function<void()>& job)
@@ -123,12 +153,35 @@ bool PauseUnlessExiting(std::chrono::milliseconds duration)
     return !state.changed.wait_for(lock, duration, [&state] { return state.exiting; });
 }
 
+ConnectionCutAtExit::ConnectionCutAtExit(Poco::Net::HTTPSession& session) : m_session(session)
+{
+    WorkState& state = State();
+    std::lock_guard<std::mutex> lock(state.mutex);
+    if (state.exiting)
+    {
+        throw Poco::IllegalStateException("the process is exiting");
+    }
+    state.sessions.insert(&m_session);
+}
+
+ConnectionCutAtExit::~ConnectionCutAtExit()
+{
+    // Under the lock: the session is not cut while it goes away.
+    WorkState& state = State();
+    std::lock_guard<std::mutex> lock(state.mutex);
+    state.sessions.erase(&m_session);
+}
+
 void OnProcessExit()
 {
     WorkState& state = State();
     std::unique_lock<std::mutex> lock(state.mutex);
     state.exiting = true;
     state.changed.notify_all();
+    for (Poco::Net::HTTPSession* session : state.sessions)
+    {
+        CutConnection(*session);
+    }
 #ifndef _WIN32
     // On Windows the other threads have already been ended when a library's
     // exit handlers run; elsewhere they are still running and about to lose

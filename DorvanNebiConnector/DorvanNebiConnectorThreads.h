@@ -9,6 +9,11 @@
 #include <chrono>
 #include <functional>
 
+namespace Poco::Net
+{
+class HTTPSession;
+}
+
 namespace DorvanNebiConnectorUtil
 {
 // Queues job on the pool and returns at once; the job never runs inside this
@@ -29,10 +34,31 @@ void PostToGuiThread(std::function<void()> closure);
 // false when it is exiting: the caller then stops.
 bool PauseUnlessExiting(std::chrono::milliseconds duration);
 
+// Held by a job for as long as it exchanges with a peer over session: when
+// the process begins to exit, the session's connection is cut (the TCP
+// connection shut down, without a TLS goodbye), so that a job waiting for a
+// peer that does not answer ends at once with a failed exchange instead of
+// outliving the libraries it uses. Throws Poco::IllegalStateException when
+// the process is already exiting: no exchange begins then.
+class ConnectionCutAtExit
+{
+public:
+    explicit ConnectionCutAtExit(Poco::Net::HTTPSession& session);
+    ~ConnectionCutAtExit();
+
+    ConnectionCutAtExit(const ConnectionCutAtExit&) = delete;
+    ConnectionCutAtExit& operator=(const ConnectionCutAtExit&) = delete;
+
+private:
+    Poco::Net::HTTPSession& m_session;
+};
+
 // Called once the process begins to exit (registered with std::atexit when the
-// connector is constructed, so that it runs before the libraries the jobs use
-// are torn down): no queued job starts any more, pauses end, nothing more is
-// delivered, and jobs already running get a short while to end. A job blocked
-// on a peer that does not answer is left to the end of the process.
+// connector is constructed, after OpenSSL has been initialised, so that it
+// runs before OpenSSL and the other libraries the jobs use are torn down): no
+// queued job starts any more, pauses end, nothing more is delivered, the
+// connections of running jobs are cut, and those jobs get a short while to
+// end. Only a job still connecting to a peer that does not answer may outlast
+// that while; it is left to the end of the process.
 void OnProcessExit();
 } // namespace DorvanNebiConnectorUtil

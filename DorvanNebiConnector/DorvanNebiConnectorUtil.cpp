@@ -3,6 +3,7 @@
 #include <DorvanNebiConnector/DorvanNebiConnector.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorConstants.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorText.h>
+#include <DorvanNebiConnector/DorvanNebiConnectorThreads.h>
 
 #include <CoreServices/Logger.h>
 #include <DorvanServices/GenericConfig.h>
@@ -83,6 +84,9 @@ bool SendHTTPRequest(const Poco::URI& uri, std::string& response)
     Poco::Net::HTTPResponse httpResponse;
     try
     {
+        // An interactive page may keep the agent's answer back for days: at
+        // process exit the connection is cut rather than waited for.
+        const DorvanNebiConnectorUtil::ConnectionCutAtExit cutAtExit(*session);
         session->sendRequest(request);
         std::istream& body = session->receiveResponse(httpResponse);
         if (httpResponse.getStatus() != Poco::Net::HTTPResponse::HTTP_OK)

@@ -3,6 +3,8 @@
 // The HTTPS session of one cloud request. Internal: not installed with the
 // public headers.
 
+#include <DorvanNebiConnector/DorvanNebiConnectorThreads.h>
+
 #include <Poco/Net/HTTPSClientSession.h>
 #include <Poco/URI.h>
 
@@ -23,4 +25,9 @@ public:
     // A connection that ends without close_notify, or breaks, throws: unlike
     // the base's own read, which takes that for a regular end.
     int ReadBody(char* buffer, std::streamsize length);
+
+private:
+    // Made after the base, gone before it: the connection is cut at process
+    // exit while the session exists.
+    DorvanNebiConnectorUtil::ConnectionCutAtExit m_cutAtExit{*this};
 };

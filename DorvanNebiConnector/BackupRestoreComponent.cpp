@@ -1,5 +1,6 @@
 #include <DorvanNebiConnector/BackupRestoreComponent.h>
 
+#include <DorvanNebiConnector/DorvanNebiBackupListReader.h>
 #include <DorvanNebiConnector/DorvanNebiConnector.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorConstants.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorText.h>
@@ -11,20 +12,17 @@
 #include <DorvanNebiConnector/DorvanNebiHTTPSPostRestClient.h>
 
 #include <CoreServices/GlobalUtils.h>
-#include <CoreServices/JsonUtil.h>
 #include <CoreServices/Logger.h>
 #include <DorvanServices/GenericConfig.h>
 
 #include <Poco/Exception.h>
 #include <Poco/Net/HTTPRequest.h>
 #include <Poco/Net/HTTPResponse.h>
-#include <json/value.h>
 #include <wx/filefn.h>
 #include <wx/log.h>
 
 #include <exception>
 #include <memory>
-#include <stdexcept>
 #include <utility>
 
 using namespace DorvanNebiConstants;
@@ -224,51 +222,6 @@ bool DeleteResource(const wxString& resourceId, const HeaderFields& headers)
     return false;
 }
 
-// ---- The list answer -------------------------------------------------------
-
-// A text member that must be a JSON string, decoded from UTF-8.
-wxString RequiredText(const Json::Value& element, const char* key)
-{
-    const Json::Value& value = element[key];
-    if (!value.isString())
-    {
-        throw std::runtime_error(std::string("\"") + key + "\" is missing or no string");
-    }
-    return wxString::FromUTF8(value.asString());
-}
-
-// One record from one element of "response". Throws (JsonCpp's
-// Json::LogicError among others) for an element that is no object, an id that
-// is an array or object, or a name or description that is no string.
-DorvanNebiResource MakeResource(const Json::Value& element)
-{
-    DorvanNebiResource resource;
-    resource.SetResourceId(element[kKeyResourceId].asString());
-    resource.SetResourceName(RequiredText(element, kKeyResourceName));
-    resource.SetResourceDescription(RequiredText(element, kKeyResourceDescription));
-    const bool isPublic = element[kKeyAccessibility].asString() == kAccessPublic;
-    resource.SetAccess(isPublic ? DorvanNebiResource::Public : DorvanNebiResource::Private);
-    return resource;
-}
-
-// Every element of "response" (an array, or an object whose member values are
-// taken in name order), or nothing when "response" is anything else. Throws
-// for an unusable element or a document that is no object.
-Resources ReadResources(const Json::Value& root)
-{
-    const Json::Value& response = root[kKeyListResponse];
-    Resources resources;
-    if (!response.isArray() && !response.isObject())
-    {
-        return resources;
-    }
-    for (const Json::Value& element : response)
-    {
-        resources.push_back(MakeResource(element));
-    }
-    return resources;
-}
-
 bool FetchBackupList(const HeaderFields& headers, Resources& resources)
 {
     try
@@ -286,14 +239,20 @@ bool FetchBackupList(const HeaderFields& headers, Resources& resources)
                       "list of backups refused, status " + StatusText(client->m_response));
             return false;
         }
-        Json::Value root;
-        if (!JsonUtil::ParseJson(client->m_responseBody, root))
+        std::string reason;
+        switch (DorvanNebiBackupListReader::Read(client->m_responseBody, resources, reason))
         {
-            LogBackup("BackupRestoreComponent::DoGetListOfBackup", __LINE__, "list of backups: the answer is no JSON");
+        case DorvanNebiBackupListReader::Result::Read:
+            return true;
+        case DorvanNebiBackupListReader::Result::NotJson:
+            LogBackup("BackupRestoreComponent::DoGetListOfBackup", __LINE__, "list of backups: " + reason);
+            return false;
+        case DorvanNebiBackupListReader::Result::Unusable:
+            LogBackup("BackupRestoreComponent::DoGetListOfBackup", __LINE__,
+                      "list of backups failed, message " + reason);
             return false;
         }
-        resources = ReadResources(root);
-        return true;
+        return false;
     }
     catch (const std::exception& e)
     {

@@ -4,9 +4,9 @@
 #include <DorvanNebiConnector/DorvanNebiConnectorText.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorThreads.h>
 #include <DorvanNebiConnector/DorvanNebiConnectorUtil.h>
+#include <DorvanNebiConnector/DorvanNebiLoginRecord.h>
 
 #include <CoreServices/GlobalUtils.h>
-#include <CoreServices/JsonUtil.h>
 #include <CoreServices/Logger.h>
 
 #include <chrono>
@@ -241,8 +241,7 @@ bool DorvanNebiLoginComponent::RequestRecord(const char* path, LoginRecord& reco
     {
         return false;
     }
-    // JSON is UTF-8, whatever the process's locale.
-    parsed = JsonUtil::ParseJson(wxString::FromUTF8(body), record) == JsonUtil::Success;
+    parsed = DorvanNebiLoginRecord::Parse(body, record);
     return true;
 }
 
@@ -251,7 +250,7 @@ void DorvanNebiLoginComponent::OnLogin(LoginRecord& data)
     {
         std::lock_guard<std::mutex> lock(m_userDataMutex);
         // A sign-in time that does not parse leaves the earlier one.
-        m_signinTime.ParseISOCombined(data[kKeySigninTime], 'T');
+        DorvanNebiLoginRecord::ReadSigninTime(data, m_signinTime);
         m_loginSession = data[kKeySessionId];
     }
     const wxString email = data[kKeyEmail];

@@ -76,7 +76,7 @@ public:
     const std::pair<std::string, std::string> GetLoginToken();
 
 private:
-    using LoginRecord = std::map<wxString, wxString>;
+    using LoginRecord = std::map<wxString, wxString>; // as DorvanNebiLoginRecord::Members
 
     void QueryLoginState();
     bool DoRefreshLoginState();

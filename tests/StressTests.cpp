@@ -98,7 +98,10 @@ TEST(ProcessExit, EndsCleanlyWithJobsInFlight)
 {
     LoopbackServer agent;
     LoopbackServer cloud(ServerTlsContext());
-    agent.Route(kLoginPath, Reply::Json(SignedInRecord()));
+    // The credentials come slowly: a cloud job running at exit is most likely
+    // still waiting for them, and would then open its TLS connection while
+    // the process is being torn down.
+    agent.Route(kLoginPath, Slow(Reply::Json(SignedInRecord()), std::chrono::milliseconds(300)));
     agent.Route("/api/v1/nebiinviteuserui", Slow(Reply::Json("{}"), std::chrono::minutes(10)));
     agent.Route("/api/v1/nebiservices", Slow(Reply::Json("[]"), std::chrono::milliseconds(100)));
     cloud.Route(kUploadPath, Slow(Reply::Json("{\"resourceid\":\"r-1\"}"), std::chrono::milliseconds(150)));
@@ -126,8 +129,12 @@ TEST(ProcessExit, EndsCleanlyWithJobsInFlight)
     EXPECT_EQ(status, 0) << output;
     EXPECT_NE(output.find("exiting with jobs in flight"), std::string::npos) << output;
     EXPECT_FALSE(HasFaultReport(output)) << output;
-    // The blocked job and the cloud's work really were under way.
+    // The blocked job and the cloud's work really were under way, and the
+    // job waiting for the page did not outlive the exit: its connection was
+    // cut, and its exchange ended (logged on the host's console).
     EXPECT_EQ(agent.RequestCount("/api/v1/nebiinviteuserui"), 1u);
+    const std::size_t exiting = output.find("exiting with jobs in flight");
+    EXPECT_NE(output.find("HTTPRequest /api/v1/nebiinviteuserui exception", exiting), std::string::npos) << output;
     EXPECT_GE(cloud.Requests().size(), 2u);
 
     const std::string sandboxLine = output.substr(0, output.find('\n'));

@@ -153,10 +153,10 @@ namespace
 {
 // The run's size and its randomness: fixed, so that a failure can be
 // repeated; DORVAN_STRESS_SEED chooses another sequence.
-constexpr int kOperationCount = 2000;
+constexpr int kOperationCount = 4000;
 constexpr unsigned kDefaultSeed = 20240611;
 // Uninitialize and Initialize again after every so many operations.
-constexpr int kReinitializeEvery = 250;
+constexpr int kReinitializeEvery = 400;
 // Requests with an id that may wait for their result at once.
 constexpr std::size_t kMaxOutstanding = 32;
 // One answer in this many meets a fault.

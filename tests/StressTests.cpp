@@ -129,12 +129,16 @@ TEST(ProcessExit, EndsCleanlyWithJobsInFlight)
     EXPECT_EQ(status, 0) << output;
     EXPECT_NE(output.find("exiting with jobs in flight"), std::string::npos) << output;
     EXPECT_FALSE(HasFaultReport(output)) << output;
-    // The blocked job and the cloud's work really were under way, and the
-    // job waiting for the page did not outlive the exit: its connection was
-    // cut, and its exchange ended (logged on the host's console).
+    // The blocked job and the cloud's work really were under way.
     EXPECT_EQ(agent.RequestCount("/api/v1/nebiinviteuserui"), 1u);
+#ifndef _WIN32
+    // The job waiting for the page did not outlive the exit: its connection
+    // was cut, and its exchange ended (logged on the host's console). On
+    // Windows the process's other threads are gone before the exit handlers
+    // run.
     const std::size_t exiting = output.find("exiting with jobs in flight");
     EXPECT_NE(output.find("HTTPRequest /api/v1/nebiinviteuserui exception", exiting), std::string::npos) << output;
+#endif
     EXPECT_GE(cloud.Requests().size(), 2u);
 
     const std::string sandboxLine = output.substr(0, output.find('\n'));

@@ -25,8 +25,14 @@ bool HostApp::OnInit()
         return false;
     }
     UseLogFile();
-    StartConnector();
-    LineUpSteps();
+    // The connector delivers its results through the event loop, which
+    // wxWidgets makes only once OnRun runs and which the connector's threads
+    // look up without a lock: started from the loop's first event, the
+    // connector never meets a loop that is still being made.
+    CallAfter([this] {
+        StartConnector();
+        LineUpSteps();
+    });
     return true;
 }
 
@@ -95,8 +101,8 @@ void HostApp::StartConnector()
     // The first use constructs the connector: it reads "quarlconfig.json"
     // beside this program and starts asking the agent who is signed in.
     DorvanNebiConnectorContext::InitializeDorvanNebiConnector();
-    // Results reach this thread only through the event loop, which has not
-    // run yet: connected now, the slots miss nothing.
+    // Results reach this thread only through the event loop, which runs them
+    // after the event that runs this: connected now, the slots miss nothing.
     m_printer = std::make_unique<SignalPrinter>();
     m_operations = std::make_unique<ConnectorOperations>();
 }

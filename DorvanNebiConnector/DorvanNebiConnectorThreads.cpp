@@ -68,6 +68,7 @@ bool IsExiting()
     return state.exiting;
 }
 
+#ifndef _WIN32
 // Shuts the session's TCP connection down, which wakes its owner from any
 // wait on the peer; the owner's thread alone closes the socket and frees it.
 // For TLS only the TCP connection is shut down: the TLS state belongs to the
@@ -91,6 +92,7 @@ void CutConnection(Poco::Net::HTTPSession& session)
         // Not connected (yet, or any more): nothing to cut.
     }
 }
+#endif
 
 void RunGuarded(const std::function<void()>& job)
 {
@@ -178,14 +180,15 @@ void OnProcessExit()
     std::unique_lock<std::mutex> lock(state.mutex);
     state.exiting = true;
     state.changed.notify_all();
+#ifndef _WIN32
+    // On Windows the other threads have already been ended when a library's
+    // exit handlers run; elsewhere they are still running and about to lose
+    // the libraries under their feet: whatever they wait for is cut short,
+    // and they get a little while to end.
     for (Poco::Net::HTTPSession* session : state.sessions)
     {
         CutConnection(*session);
     }
-#ifndef _WIN32
-    // On Windows the other threads have already been ended when a library's
-    // exit handlers run; elsewhere they are still running and about to lose
-    // the libraries under their feet.
     state.changed.wait_for(lock, kExitGracePeriod, [&state] { return state.running == 0; });
 #endif
 }

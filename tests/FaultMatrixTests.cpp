@@ -39,7 +39,7 @@ const char kResourcePath[] = "/api/clientapp/v1/resource/r-1/";
 // operation to be waiting on it.
 constexpr std::chrono::milliseconds kSlowAnswer(300);
 // After the final signal: long enough for a second one to show up.
-constexpr std::chrono::milliseconds kLinger(300);
+constexpr std::chrono::milliseconds kLinger(200);
 
 enum class Peer
 {

@@ -45,16 +45,24 @@ wxString CloudConfigPath()
 
 std::atomic<DorvanNebiConnector*> DorvanNebiConnector::m_pInstance{nullptr};
 
+// The entry functions' access to the connector's private Initialize() and
+// Uninitialize(); the library's own, never exported.
+struct DorvanNebiConnectorEntry
+{
+    static bool Initialize(DorvanNebiConnector* connector) { return connector->Initialize(); }
+    static bool Uninitialize(DorvanNebiConnector* connector) { return connector->Uninitialize(); }
+};
+
 namespace DorvanNebiConnectorContext
 {
 bool InitializeDorvanNebiConnector()
 {
-    return DorvanNebiConnector::GetInstance()->Initialize();
+    return DorvanNebiConnectorEntry::Initialize(DorvanNebiConnector::GetInstance());
 }
 
 bool UninitializeDorvanNebiConnector()
 {
-    return DorvanNebiConnector::GetInstance()->Uninitialize();
+    return DorvanNebiConnectorEntry::Uninitialize(DorvanNebiConnector::GetInstance());
 }
 } // namespace DorvanNebiConnectorContext
 

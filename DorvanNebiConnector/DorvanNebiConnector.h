@@ -19,6 +19,7 @@ class DorvanNebiLoginComponent;
 class DorvanNebiServicesComponent;
 class BackupRestoreComponent;
 class DorvanNebiConnector;
+struct DorvanNebiConnectorEntry;
 
 namespace DorvanNebiConnectorContext
 {
@@ -59,8 +60,10 @@ public:
     DorvanNebiConnector& operator=(const DorvanNebiConnector&) = delete;
 
 private:
-    friend bool DorvanNebiConnectorContext::InitializeDorvanNebiConnector();
-    friend bool DorvanNebiConnectorContext::UninitializeDorvanNebiConnector();
+    // The entry functions reach Initialize() and Uninitialize() through it. (A
+    // friend function declaration would drop the entry functions' dllimport
+    // in a Windows host.)
+    friend struct DorvanNebiConnectorEntry;
 
     DorvanNebiConnector();
     ~DorvanNebiConnector() override;

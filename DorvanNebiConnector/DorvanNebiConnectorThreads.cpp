@@ -10,6 +10,7 @@
 #include <boost/asio/post.hpp>
 #include <wx/app.h>
 
+#include <atomic>
 #include <condition_variable>
 #include <exception>
 #include <mutex>
@@ -18,8 +19,10 @@
 
 namespace
 {
+#ifndef _WIN32
 // How long an exiting process waits for jobs that are running.
 constexpr std::chrono::seconds kExitGracePeriod(2);
+#endif
 
 // The jobs running now, and whether the process is exiting. Never destroyed:
 // workers may still look at it while the process ends.
@@ -28,7 +31,8 @@ struct WorkState
     std::mutex mutex;
     std::condition_variable changed;
     int running = 0;
-    bool exiting = false;
+    // Written under the mutex, except on Windows at exit (see OnProcessExit).
+    std::atomic<bool> exiting{false};
     // The sessions over which running jobs exchange with a peer now.
     std::set<Poco::Net::HTTPSession*> sessions;
 };
@@ -65,7 +69,7 @@ bool IsExiting()
 {
     WorkState& state = State();
     std::lock_guard<std::mutex> lock(state.mutex);
-    return state.exiting;
+    return state.exiting.load();
 }
 
 #ifndef _WIN32
@@ -152,7 +156,7 @@ bool PauseUnlessExiting(std::chrono::milliseconds duration)
 {
     WorkState& state = State();
     std::unique_lock<std::mutex> lock(state.mutex);
-    return !state.changed.wait_for(lock, duration, [&state] { return state.exiting; });
+    return !state.changed.wait_for(lock, duration, [&state] { return state.exiting.load(); });
 }
 
 ConnectionCutAtExit::ConnectionCutAtExit(Poco::Net::HTTPSession& session) : m_session(session)
@@ -177,14 +181,20 @@ ConnectionCutAtExit::~ConnectionCutAtExit()
 void OnProcessExit()
 {
     WorkState& state = State();
+#ifdef _WIN32
+    // A DLL's exit handlers run when ExitProcess has already ended every
+    // other thread, wherever it was: a worker may have died holding the
+    // mutex, or waiting on the condition variable, whose broadcast would then
+    // wait for that dead waiter for ever. Touch neither; no job runs any more
+    // anyway, and the connections die with the process.
+    state.exiting.store(true);
+#else
     std::unique_lock<std::mutex> lock(state.mutex);
-    state.exiting = true;
+    state.exiting.store(true);
     state.changed.notify_all();
-#ifndef _WIN32
-    // On Windows the other threads have already been ended when a library's
-    // exit handlers run; elsewhere they are still running and about to lose
-    // the libraries under their feet: whatever they wait for is cut short,
-    // and they get a little while to end.
+    // The workers are still running and about to lose the libraries under
+    // their feet: whatever they wait for is cut short, and they get a little
+    // while to end.
     for (Poco::Net::HTTPSession* session : state.sessions)
     {
         CutConnection(*session);

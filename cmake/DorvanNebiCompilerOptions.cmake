@@ -9,6 +9,15 @@ function(dorvan_nebi_target_options target)
     endif()
 endfunction()
 
+# The project's shared libraries. On Windows they are DLLs named as Windows
+# names them (DorvanNebiConnector.dll, not libDorvanNebiConnector.dll); their
+# import libraries keep the lib prefix that MinGW linkers look for.
+function(dorvan_nebi_shared_library_options target)
+    if(WIN32)
+        set_target_properties(${target} PROPERTIES PREFIX "")
+    endif()
+endfunction()
+
 if(DORVAN_NEBI_SANITIZER STREQUAL "address")
     set(_flags -fsanitize=address,undefined -fno-sanitize-recover=undefined -fno-omit-frame-pointer)
 elseif(DORVAN_NEBI_SANITIZER STREQUAL "thread")

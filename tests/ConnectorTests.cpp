@@ -10,10 +10,17 @@
 #include <DorvanNebiConnector/DorvanNebiServicesComponent.h>
 #include <DorvanServices/GenericConfig.h>
 
+#include <Poco/Net/ServerSocket.h>
+#include <Poco/Net/SocketAddress.h>
+#include <Poco/Pipe.h>
+#include <Poco/PipeStream.h>
+#include <Poco/Process.h>
 #include <gtest/gtest.h>
 #include <wx/app.h>
 #include <wx/filename.h>
 
+#include <functional>
+#include <string>
 #include <thread>
 
 using namespace TestSupport;
@@ -196,4 +203,100 @@ TEST_F(Connector, WithoutAnApplicationObjectResultsAreDroppedAndLogged)
     }();
     wxApp::SetInstance(app);
     EXPECT_TRUE(logged);
+}
+
+// The process exit. A host whose main() returns while connector jobs are in
+// flight ends at once and with the exit code main() returned: the jobs are
+// neither waited for nor allowed to hang or crash the exit.
+namespace
+{
+struct ExitingHost
+{
+    bool ended = false;
+    int exitCode = -1;
+    std::string output;
+};
+
+// Runs exit_with_jobs MODE PORT; once it has printed "posted", calls
+// whenPosted (which may write to its standard input), then waits for its end.
+// A host still running a minute later is taken for hung and killed.
+ExitingHost RunExitingHost(const std::string& mode, unsigned short port,
+                           const std::function<void(Poco::PipeOutputStream&)>& whenPosted)
+{
+    Poco::Pipe in;
+    Poco::Pipe out;
+    Poco::ProcessHandle process = Poco::Process::launch(HelperProgram("exit_with_jobs").utf8_string(),
+                                                        {mode, std::to_string(port)}, &in, &out, nullptr);
+    Poco::PipeInputStream fromHost(out);
+    Poco::PipeOutputStream toHost(in);
+    ExitingHost host;
+    std::string line;
+    while (std::getline(fromHost, line))
+    {
+        host.output += line + "\n";
+        if (line.rfind("posted", 0) == 0)
+        {
+            whenPosted(toHost);
+            break;
+        }
+    }
+    toHost.close();
+    for (int i = 0; i < 600 && !host.ended; ++i)
+    {
+        host.exitCode = process.tryWait();
+        host.ended = host.exitCode != -1;
+        if (!host.ended)
+        {
+            std::this_thread::sleep_for(std::chrono::milliseconds(100));
+        }
+    }
+    if (!host.ended)
+    {
+        Poco::Process::kill(process.id()); // by id: keeps the handle open on Windows
+        process.wait();
+    }
+    for (std::string rest; std::getline(fromHost, rest);)
+    {
+        host.output += rest + "\n";
+    }
+    return host;
+}
+
+unsigned short PortNobodyListensOn()
+{
+    Poco::Net::ServerSocket socket(Poco::Net::SocketAddress("127.0.0.1", 0));
+    const unsigned short port = socket.address().port();
+    socket.close();
+    return port;
+}
+} // namespace
+
+// On Windows the connector's exit handler runs when the workers have already
+// been ended; one that waited in a pause must not make the exit wait for it.
+TEST(ProcessExit, HostEndsWhileTheStartupQueryPausesBetweenAttempts)
+{
+    const ExitingHost host = RunExitingHost("paused", PortNobodyListensOn(), [](Poco::PipeOutputStream&) {});
+    ASSERT_TRUE(host.ended) << "the host did not end; it printed:\n" << host.output;
+    EXPECT_EQ(host.exitCode, 7) << host.output;
+    EXPECT_NE(host.output.find("leaving main"), std::string::npos) << host.output;
+}
+
+TEST(ProcessExit, HostEndsWhileJobsWaitForASilentAgent)
+{
+    LoopbackServer agent;
+    agent.Route("/api/v1/nebilogin", Reply::Json(SignedOutRecord()));
+    Reply never = Reply::Json("[]");
+    never.delay = std::chrono::hours(1); // cut short only when the agent stops
+    agent.Route("/api/v1/nebiservices", never);
+
+    const ExitingHost host = RunExitingHost("blocked", agent.Port(), [&agent](Poco::PipeOutputStream& toHost) {
+        // Both workers hold a request to the agent; the third job is queued.
+        EXPECT_TRUE(agent.WaitForRequests("/api/v1/nebiservices", 2));
+        toHost << "exit" << std::endl;
+    });
+    ASSERT_TRUE(host.ended) << "the host did not end; it printed:\n" << host.output;
+    EXPECT_EQ(host.exitCode, 7) << host.output;
+    EXPECT_NE(host.output.find("leaving main"), std::string::npos) << host.output;
+    // The queued job never started.
+    EXPECT_EQ(agent.RequestCount("/api/v1/nebiservices"), 2u);
 }

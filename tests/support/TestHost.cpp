@@ -104,6 +104,21 @@ wxString UserDataDir()
     return Join(g_sandbox, "userdata");
 }
 
+wxString ProgramDir()
+{
+    // The standard paths' own answer, not the sandbox's.
+    return wxFileName(wxStandardPaths::Get().wxStandardPaths::GetExecutablePath()).GetPath();
+}
+
+wxString HelperProgram(const wxString& name)
+{
+#ifdef _WIN32
+    return Join(ProgramDir(), name + ".exe");
+#else
+    return Join(ProgramDir(), name);
+#endif
+}
+
 void WriteCloudConfig(const std::string& json)
 {
     WriteFile(Join(ExecutableDir(), "quarlconfig.json"), json);

@@ -30,6 +30,12 @@ wxString SandboxDir();
 wxString ExecutableDir();
 wxString UserDataDir();
 
+// Where the test program itself and the helper programs built with it lie
+// (the build tree's bin/), and the path of the helper program called name
+// there, with ".exe" on Windows.
+wxString ProgramDir();
+wxString HelperProgram(const wxString& name);
+
 // Writes "quarlconfig.json" beside the executable. Do it before the first
 // use of the connector, which reads the file once.
 void WriteCloudConfig(const std::string& json);

@@ -6,6 +6,8 @@ find_dependency(Threads)
 # Asio, Signals2, PropertyTree and System are header-only.
 find_dependency(Boost 1.74)
 find_dependency(Poco COMPONENTS Foundation Net NetSSL Crypto)
+# CoreServices reads certificates into OpenSSL's stores (SystemCertificates).
+find_dependency(OpenSSL 3)
 find_dependency(jsoncpp)
 
 # wxWidgets' find module defines variables, not a target: wrap the base

@@ -30,9 +30,14 @@ TEST(CertificateAuthority, ReloadedAuthorityIssuesCertificatesForExactlyTheGiven
     const std::filesystem::path directory = GlobalUtils::ToFileSystemPath(TestSupport::SandboxDir());
     WritePemFile(directory / "ca.pem", created.GetCredentials().certificatePem, false);
     WritePemFile(directory / "ca-key.pem", created.GetCredentials().privateKeyPem, true);
+#ifndef _WIN32
+    // POSIX permission bits. Windows has none to check: std::filesystem
+    // there mirrors the read-only flag into every class, and who may read a
+    // file is the business of its folder's access control list.
     const auto keyPermissions = std::filesystem::status(directory / "ca-key.pem").permissions();
     EXPECT_EQ(keyPermissions & (std::filesystem::perms::group_all | std::filesystem::perms::others_all),
               std::filesystem::perms::none);
+#endif
 
     // As a stand-in does at its second start: the authority from its files.
     const CertificateAuthority loaded = CertificateAuthority::Load(

@@ -8,9 +8,7 @@ if(TARGET dorvan-nebi-host AND TARGET quarl-agent-sim AND TARGET nebi-cloud-sim)
         endtoend/HostInputTests.cpp
         endtoend/StandInTests.cpp)
     target_link_libraries(EndToEndTests PRIVATE DorvanNebiPki)
-    target_compile_definitions(EndToEndTests PRIVATE
-        QUARL_AGENT_SIM_PATH="$<TARGET_FILE:quarl-agent-sim>"
-        NEBI_CLOUD_SIM_PATH="$<TARGET_FILE:nebi-cloud-sim>"
-        DORVAN_NEBI_HOST_PATH="$<TARGET_FILE:dorvan-nebi-host>")
+    # The programs are found beside the test program at run time
+    # (TestSupport::HelperProgram).
     add_dependencies(EndToEndTests quarl-agent-sim nebi-cloud-sim dorvan-nebi-host)
 endif()

@@ -2,6 +2,10 @@
 
 #include "TestHost.h"
 
+#include <CoreServices/GlobalUtils.h>
+
+#include <Poco/Environment.h>
+
 #include <gtest/gtest.h>
 
 #include <filesystem>
@@ -34,6 +38,16 @@ std::string LastLine(const std::string& text)
 }
 } // namespace
 
+std::string AgentProgram()
+{
+    return TestSupport::HelperProgram("quarl-agent-sim").utf8_string();
+}
+
+std::string CloudProgram()
+{
+    return TestSupport::HelperProgram("nebi-cloud-sim").utf8_string();
+}
+
 ChildProcess::ChildProcess(const std::string& program, const std::vector<std::string>& arguments,
                            const std::map<std::string, std::string>& environment)
 {
@@ -47,7 +61,9 @@ ChildProcess::~ChildProcess()
 {
     if (IsRunning())
     {
-        Poco::Process::kill(*m_handle);
+        // By process id: killing by handle would close the handle on
+        // Windows, after which the process could no longer be waited for.
+        Poco::Process::kill(m_handle->id());
     }
     WaitForExit(10s);
     if (m_reader.joinable())
@@ -69,7 +85,15 @@ void ChildProcess::Collect()
             m_changed.notify_all();
             return;
         }
-        m_output.append(buffer, static_cast<std::size_t>(got));
+        // Text: Windows ends the lines of a program's console output with
+        // CR LF; keep the LF alone, as elsewhere.
+        for (int i = 0; i < got; ++i)
+        {
+            if (buffer[i] != '\r')
+            {
+                m_output += buffer[i];
+            }
+        }
         m_changed.notify_all();
     }
 }
@@ -97,7 +121,7 @@ int ChildProcess::WaitForExit(std::chrono::milliseconds timeout)
         if (!m_changed.wait_for(lock, timeout, [this] { return m_outputEnded; }))
         {
             lock.unlock();
-            Poco::Process::kill(*m_handle);
+            Poco::Process::kill(m_handle->id());
         }
     }
     if (!m_reaped)
@@ -133,7 +157,7 @@ Agent::Agent(const std::vector<std::string>& options)
 {
     std::vector<std::string> arguments{"--port", "0"};
     arguments.insert(arguments.end(), options.begin(), options.end());
-    m_process = std::make_unique<ChildProcess>(QUARL_AGENT_SIM_PATH, arguments);
+    m_process = std::make_unique<ChildProcess>(AgentProgram(), arguments);
     const std::string started = m_process->WaitForOutput("listening on");
     if (started.empty())
     {
@@ -146,7 +170,7 @@ Cloud::Cloud(const std::string& dataDir, const std::vector<std::string>& options
 {
     std::vector<std::string> arguments{"--port", "0", "--data", dataDir};
     arguments.insert(arguments.end(), options.begin(), options.end());
-    m_process = std::make_unique<ChildProcess>(NEBI_CLOUD_SIM_PATH, arguments);
+    m_process = std::make_unique<ChildProcess>(CloudProgram(), arguments);
     const std::string started = m_process->WaitForOutput("CA certificate");
     if (started.empty())
     {
@@ -158,13 +182,23 @@ Cloud::Cloud(const std::string& dataDir, const std::vector<std::string>& options
 }
 
 Host::Host()
-    : m_directory(SandboxPath("host")), m_program(SandboxPath("host/dorvan-nebi-host")),
+    : m_directory(SandboxPath("host")), m_program(SandboxPath(HostProgramName())),
       m_userData(SandboxPath("host-userdata"))
 {
-    std::filesystem::create_directories(m_directory);
-    std::filesystem::create_directories(m_userData);
+    std::filesystem::create_directories(std::filesystem::u8path(m_directory));
+    std::filesystem::create_directories(std::filesystem::u8path(m_userData));
     // The host reads "quarlconfig.json" beside itself: a copy of its own.
-    std::filesystem::copy_file(DORVAN_NEBI_HOST_PATH, m_program);
+    std::filesystem::copy_file(GlobalUtils::ToFileSystemPath(TestSupport::HelperProgram("dorvan-nebi-host")),
+                               std::filesystem::u8path(m_program));
+}
+
+std::string Host::HostProgramName()
+{
+#ifdef _WIN32
+    return "host/dorvan-nebi-host.exe";
+#else
+    return "host/dorvan-nebi-host";
+#endif
 }
 
 void Host::Configure(unsigned short agentPort, unsigned short cloudPort)
@@ -177,9 +211,15 @@ void Host::Configure(unsigned short agentPort, unsigned short cloudPort)
 
 HostResult Host::Run(const std::vector<std::string>& arguments) const
 {
-    ChildProcess host(
-        m_program, arguments,
-        {{"DORVAN_USER_DATA_DIR", m_userData}, {"DORVAN_LOG_FILE", SandboxPath("host.log")}, {"LC_ALL", "C.UTF-8"}});
+    std::map<std::string, std::string> environment{
+        {"DORVAN_USER_DATA_DIR", m_userData}, {"DORVAN_LOG_FILE", SandboxPath("host.log")}, {"LC_ALL", "C.UTF-8"}};
+#ifdef _WIN32
+    // The copy has no DLLs beside it: Windows finds them on the PATH, here
+    // the build tree's folder of programs and DLLs.
+    const std::string path = Poco::Environment::get("PATH", "");
+    environment["PATH"] = TestSupport::ProgramDir().utf8_string() + (path.empty() ? "" : ";" + path);
+#endif
+    ChildProcess host(m_program, arguments, environment);
     HostResult result;
     result.status = host.WaitForExit();
     result.output = host.Output();

@@ -20,6 +20,10 @@ namespace EndToEnd
 {
 using namespace std::chrono_literals;
 
+// The stand-ins' programs, beside the test program.
+std::string AgentProgram();
+std::string CloudProgram();
+
 // A program started by a test, with its stdout and stderr collected. Ended,
 // if it still runs, when the object goes.
 class ChildProcess
@@ -110,6 +114,9 @@ public:
     const std::string& UserDataDir() const { return m_userData; }
 
 private:
+    // The copy's path within the sandbox.
+    static std::string HostProgramName();
+
     std::string m_directory;
     std::string m_program;
     std::string m_userData;

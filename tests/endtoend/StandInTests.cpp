@@ -165,19 +165,19 @@ TEST(AgentStandIn, BadRequestsGetAnErrorAndItGoesOnServing)
 
 TEST(AgentStandIn, CommandLineAndServicesFile)
 {
-    ChildProcess help(QUARL_AGENT_SIM_PATH, {"--help"});
+    ChildProcess help(AgentProgram(), {"--help"});
     EXPECT_EQ(help.WaitForExit(), 0);
     EXPECT_NE(help.Output().find("--api-secret"), std::string::npos) << help.Output();
 
-    ChildProcess badPort(QUARL_AGENT_SIM_PATH, {"--port", "seventy"});
+    ChildProcess badPort(AgentProgram(), {"--port", "seventy"});
     EXPECT_NE(badPort.WaitForExit(), 0);
     EXPECT_NE(badPort.Output().find("port must be an integer"), std::string::npos) << badPort.Output();
 
-    ChildProcess missing(QUARL_AGENT_SIM_PATH, {"--port", "0", "--services", SandboxPath("none.json")});
+    ChildProcess missing(AgentProgram(), {"--port", "0", "--services", SandboxPath("none.json")});
     EXPECT_NE(missing.WaitForExit(), 0);
     EXPECT_NE(missing.Output().find("cannot open the services file"), std::string::npos) << missing.Output();
 
-    ChildProcess notAList(QUARL_AGENT_SIM_PATH, {"--port", "0", "--services", ServicesFile("{\"a\": 1}")});
+    ChildProcess notAList(AgentProgram(), {"--port", "0", "--services", ServicesFile("{\"a\": 1}")});
     EXPECT_NE(notAList.WaitForExit(), 0);
     EXPECT_NE(notAList.Output().find("does not hold a JSON array"), std::string::npos) << notAList.Output();
 
@@ -356,17 +356,17 @@ TEST_F(CloudStandIn, MalformedRequestsGetA4xxAndItGoesOnServing)
 
 TEST(CloudStandInCommandLine, BadOptionsAndUnusableDirectoriesAreNamed)
 {
-    ChildProcess help(NEBI_CLOUD_SIM_PATH, {"--help"});
+    ChildProcess help(CloudProgram(), {"--help"});
     EXPECT_EQ(help.WaitForExit(), 0);
     EXPECT_NE(help.Output().find("--data"), std::string::npos) << help.Output();
 
-    ChildProcess basePath(NEBI_CLOUD_SIM_PATH, {"--base-path", "api/"});
+    ChildProcess basePath(CloudProgram(), {"--base-path", "api/"});
     EXPECT_NE(basePath.WaitForExit(), 0);
     EXPECT_NE(basePath.Output().find("--base-path must start with"), std::string::npos) << basePath.Output();
 
     const std::string notADirectory = SandboxPath("a-file");
     WriteWholeFile(notADirectory, "x");
-    ChildProcess unusable(NEBI_CLOUD_SIM_PATH, {"--port", "0", "--data", notADirectory});
+    ChildProcess unusable(CloudProgram(), {"--port", "0", "--data", notADirectory});
     EXPECT_NE(unusable.WaitForExit(), 0);
     EXPECT_NE(unusable.Output().find("cannot start"), std::string::npos) << unusable.Output();
 }

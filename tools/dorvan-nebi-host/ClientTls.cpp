@@ -1,5 +1,7 @@
 #include "ClientTls.h"
 
+#include <CoreServices/SystemCertificates.h>
+
 #include <Poco/Net/Context.h>
 #include <Poco/Net/NetSSL.h>
 #include <Poco/Net/RejectCertificateHandler.h>
@@ -20,10 +22,15 @@ bool TrustCertificates(const wxString& caFile, wxString& error)
     {
         // With a CA file, that authority alone is trusted; without one, the
         // system's authorities are.
-        const bool useSystemStore = caFile.empty();
         Poco::Net::Context::Ptr context =
             new Poco::Net::Context(Poco::Net::Context::CLIENT_USE, "", "", caFile.utf8_string(),
-                                   Poco::Net::Context::VERIFY_RELAXED, 9, useSystemStore);
+                                   Poco::Net::Context::VERIFY_RELAXED, 9, false);
+        if (caFile.empty())
+        {
+            // The system's authorities: on Windows those of its "ROOT"
+            // certificate store, which OpenSSL alone would not find.
+            SystemCertificates::TrustSystemRoots(*context);
+        }
         // A certificate that fails verification is refused, never accepted.
         Poco::Net::SSLManager::instance().initializeClient(nullptr, new Poco::Net::RejectCertificateHandler(false),
                                                            context);

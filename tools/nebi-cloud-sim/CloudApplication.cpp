@@ -2,6 +2,7 @@
 
 #include "CloudTls.h"
 #include "ResourceStore.h"
+#include "StopRequest.h"
 
 #include <Poco/AutoPtr.h>
 #include <Poco/ConsoleChannel.h>
@@ -17,8 +18,6 @@
 #include <Poco/Util/IntValidator.h>
 #include <Poco/Util/OptionException.h>
 #include <Poco/Util/OptionSet.h>
-#include <boost/asio/io_context.hpp>
-#include <boost/asio/signal_set.hpp>
 
 #include <csignal>
 #include <iostream>
@@ -89,6 +88,7 @@ void CloudApplication::PrintHelp()
 {
     Poco::Util::HelpFormatter help(options());
     help.setCommand(commandName());
+    help.setUnixStyle(true); // --option, as on the command line (POCO's Windows default is /option)
     help.setUsage("[OPTIONS]");
     help.setHeader("A stand-in of the cloud's REST interface: keeps uploaded settings archives in a directory "
                    "and serves them over HTTPS on 127.0.0.1. At first start it makes its own certificate "
@@ -152,17 +152,16 @@ int CloudApplication::Serve()
     Poco::Net::HTTPServerParams::Ptr params = new Poco::Net::HTTPServerParams();
     params->setMaxThreads(8);
     Poco::Net::HTTPServer server(new CloudRequestHandlerFactory({m_settings, *store, logger()}), *socket, params);
-    // Ctrl+C and SIGTERM end the wait below, whichever thread receives them.
-    boost::asio::io_context stopSignals;
-    boost::asio::signal_set signals(stopSignals, SIGINT, SIGTERM);
-    signals.async_wait([](const boost::system::error_code&, int) {});
+    // Ctrl+C, SIGTERM or (on Windows) POCO's termination request end the
+    // wait below.
+    StopRequest stopRequest;
     server.start();
 
     logger().information("listening on https://127.0.0.1:" + std::to_string(socket->address().port()) +
                          m_settings.basePath);
     logger().information(std::string("CA certificate") + (tls.created ? " (new)" : "") + ": " + tls.authority);
     logger().information("archives in " + dataDir + ": " + std::to_string(store->Count()) + " stored");
-    stopSignals.run();
+    stopRequest.Wait();
     server.stopAll(true);
     logger().information("stopped");
     return EXIT_OK;

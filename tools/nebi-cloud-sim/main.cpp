@@ -13,7 +13,13 @@
 #include <exception>
 #include <iostream>
 
+#ifdef _WIN32
+// The wide command line: Windows hands main() its arguments in the ANSI code
+// page, which cannot hold every name. (Linked with -municode.)
+int wmain(int argc, wchar_t** argv)
+#else
 int main(int argc, char** argv)
+#endif
 {
     try
     {
@@ -23,6 +29,8 @@ int main(int argc, char** argv)
         Poco::AutoPtr<Poco::ConsoleChannel> console(new Poco::ConsoleChannel(std::cerr));
         Poco::AutoPtr<Poco::PatternFormatter> format(new Poco::PatternFormatter("nebi-cloud-sim: %t"));
         application.logger().setChannel(new Poco::FormattingChannel(format, console));
+        // --port and -p everywhere: POCO's default on Windows is /port.
+        application.setUnixOptions(true);
         application.init(argc, argv); // reads the options
         return application.run();
     }

@@ -1,6 +1,7 @@
 #include "AgentApplication.h"
 
 #include "AgentRequestHandler.h"
+#include "StopRequest.h"
 #include "ServicesCatalogue.h"
 
 #include <Poco/AutoPtr.h>
@@ -15,8 +16,6 @@
 #include <Poco/Util/HelpFormatter.h>
 #include <Poco/Util/IntValidator.h>
 #include <Poco/Util/OptionSet.h>
-#include <boost/asio/io_context.hpp>
-#include <boost/asio/signal_set.hpp>
 
 #include <csignal>
 #include <iostream>
@@ -88,6 +87,7 @@ void AgentApplication::PrintHelp()
 {
     Poco::Util::HelpFormatter help(options());
     help.setCommand(commandName());
+    help.setUnixStyle(true); // --option, as on the command line (POCO's Windows default is /option)
     help.setUsage("[OPTIONS]");
     help.setHeader("A stand-in of the local agent: serves the agent's endpoints below /api/v1 over plain HTTP "
                    "on 127.0.0.1, for one user whose sign-in the login, sign-up and logout pages change.");
@@ -139,16 +139,15 @@ int AgentApplication::main(const std::vector<std::string>& args)
     Poco::Net::HTTPServerParams::Ptr params = new Poco::Net::HTTPServerParams();
     params->setMaxThreads(8);
     Poco::Net::HTTPServer server(new AgentRequestHandlerFactory({signIn, services, logger()}), socket, params);
-    // Ctrl+C and SIGTERM end the wait below, whichever thread receives them.
-    boost::asio::io_context stopSignals;
-    boost::asio::signal_set signals(stopSignals, SIGINT, SIGTERM);
-    signals.async_wait([](const boost::system::error_code&, int) {});
+    // Ctrl+C, SIGTERM or (on Windows) POCO's termination request end the
+    // wait below.
+    StopRequest stopRequest;
     server.start();
 
     logger().information("listening on http://127.0.0.1:" + std::to_string(socket.address().port()) + "/api/v1");
     logger().information("user " + m_user.name + " <" + m_user.email + ">, role " + m_user.role + ", " +
                          (m_signedIn ? "signed in" : "signed out"));
-    stopSignals.run();
+    stopRequest.Wait();
     server.stopAll(true);
     logger().information("stopped");
     return EXIT_OK;

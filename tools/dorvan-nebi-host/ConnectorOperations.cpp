@@ -20,7 +20,7 @@ ConnectorOperations::ConnectorOperations()
       m_services(DorvanNebiConnector::GetInstance()->GetServicesComponent()),
       m_backup(DorvanNebiConnector::GetInstance()->GetBackupRestoreComponent())
 {
-    m_timer.Bind(wxEVT_TIMER, [this](wxTimerEvent&) {
+    m_timer.SetAction([this] {
         std::function<void()> action = std::move(m_timerAction);
         m_timerAction = nullptr;
         if (action)

@@ -5,6 +5,8 @@
 // outcome of that very request (matched by its request id), calls done with
 // the outcome on a later turn of the event loop. One operation at a time.
 
+#include "GuiTimer.h"
+
 #include <DorvanNebiConnector/BackupRestoreComponent.h>
 #include <DorvanNebiConnector/DorvanNebiLoginComponent.h>
 #include <DorvanNebiConnector/DorvanNebiResource.h>
@@ -12,7 +14,6 @@
 
 #include <boost/signals2/connection.hpp>
 #include <wx/string.h>
-#include <wx/timer.h>
 
 #include <chrono>
 #include <functional>
@@ -72,6 +73,6 @@ private:
     std::shared_ptr<DorvanNebiServicesComponent> m_services;
     std::shared_ptr<BackupRestoreComponent> m_backup;
     boost::signals2::scoped_connection m_pending; // the slot waiting for the current result
-    wxTimer m_timer;
+    GuiTimer m_timer;
     std::function<void()> m_timerAction;
 };

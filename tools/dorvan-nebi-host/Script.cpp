@@ -7,7 +7,7 @@
 Script::Script(std::chrono::seconds timeout, std::function<void(int status)> finished)
     : m_timeout(timeout), m_finished(std::move(finished))
 {
-    m_timer.Bind(wxEVT_TIMER, [this](wxTimerEvent&) { OnTimeout(); });
+    m_timer.SetAction([this] { OnTimeout(); });
 }
 
 void Script::Add(const wxString& title, Step step)

@@ -5,8 +5,9 @@
 // it was given, and the next step starts. A step that fails, or does not
 // finish within the timeout, ends the script.
 
+#include "GuiTimer.h"
+
 #include <wx/string.h>
-#include <wx/timer.h>
 
 #include <chrono>
 #include <functional>
@@ -44,5 +45,5 @@ private:
     std::vector<Entry> m_steps;
     std::size_t m_current = 0;
     bool m_ended = false;
-    wxTimer m_timer;
+    GuiTimer m_timer;
 };

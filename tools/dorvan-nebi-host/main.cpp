@@ -18,7 +18,14 @@
 #include <cstdlib>
 #include <iostream>
 
+#ifdef _WIN32
+// The wide command line: Windows hands main() its arguments in the ANSI code
+// page, which turns names such as "Ωmega ✓ 設定" into question marks; the
+// wxWidgets application then takes them from here. (Linked with -municode.)
+int wmain(int argc, wchar_t** argv)
+#else
 int main(int argc, char** argv)
+#endif
 {
     HostApp* app = new HostApp();
     wxApp::SetInstance(app);

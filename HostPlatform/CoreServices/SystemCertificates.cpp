@@ -39,12 +39,10 @@ std::size_t TrustSystemRoots(Poco::Net::Context& context)
 #ifdef _WIN32
 std::size_t TrustWindowsStore(Poco::Net::Context& context, const wchar_t* storeName)
 {
-    // The current user's view of the system store, as CertOpenSystemStore
-    // gives it, opened for reading only.
-    HCERTSTORE store = CertOpenStore(CERT_STORE_PROV_SYSTEM_W, 0, 0,
-                                     CERT_SYSTEM_STORE_CURRENT_USER | CERT_STORE_READONLY_FLAG |
-                                         CERT_STORE_OPEN_EXISTING_FLAG,
-                                     storeName);
+    // The current user's view of the system store. (Opened as
+    // CertOpenSystemStore opens it: a read-only open of the user's part
+    // fails where that part was never made, as in a new Wine prefix.)
+    HCERTSTORE store = CertOpenSystemStoreW(0, storeName);
     if (!store)
     {
         SetLevelAndGetLogger(SeverityError, kSource, "SystemCertificates::TrustWindowsStore", __LINE__)

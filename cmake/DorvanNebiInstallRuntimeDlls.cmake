@@ -6,6 +6,10 @@
 #
 # Inputs: DORVAN_NEBI_OBJDUMP, DORVAN_NEBI_DLL_SOURCE, DORVAN_NEBI_BIN_DIR.
 
+# Install scripts run without the project's policies.
+cmake_policy(PUSH)
+cmake_policy(VERSION 3.20)
+
 # DLLs that every Windows installation has (or, for the api-ms-win-* names,
 # that Windows resolves itself).
 set(_system_dlls
@@ -54,3 +58,5 @@ while(_pending)
         endif()
     endforeach()
 endwhile()
+
+cmake_policy(POP)

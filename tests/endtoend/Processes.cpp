@@ -5,6 +5,7 @@
 #include <CoreServices/GlobalUtils.h>
 
 #include <Poco/Environment.h>
+#include <Poco/Exception.h>
 
 #include <gtest/gtest.h>
 
@@ -61,14 +62,26 @@ ChildProcess::~ChildProcess()
 {
     if (IsRunning())
     {
-        // By process id: killing by handle would close the handle on
-        // Windows, after which the process could no longer be waited for.
-        Poco::Process::kill(m_handle->id());
+        Kill();
     }
     WaitForExit(10s);
     if (m_reader.joinable())
     {
         m_reader.join();
+    }
+}
+
+void ChildProcess::Kill()
+{
+    try
+    {
+        // By process id: killing by handle would close the handle on
+        // Windows, after which the process could no longer be waited for.
+        Poco::Process::kill(m_handle->id());
+    }
+    catch (const Poco::Exception&)
+    {
+        // It ended meanwhile (Windows refuses to end a process that has).
     }
 }
 
@@ -121,7 +134,7 @@ int ChildProcess::WaitForExit(std::chrono::milliseconds timeout)
         if (!m_changed.wait_for(lock, timeout, [this] { return m_outputEnded; }))
         {
             lock.unlock();
-            Poco::Process::kill(m_handle->id());
+            Kill();
         }
     }
     if (!m_reaped)

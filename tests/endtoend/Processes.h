@@ -52,6 +52,7 @@ public:
 
 private:
     void Collect();
+    void Kill();
 
     Poco::Pipe m_pipe; // stdout and stderr of the process
     std::unique_ptr<Poco::ProcessHandle> m_handle;

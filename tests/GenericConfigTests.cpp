@@ -235,3 +235,19 @@ TEST(GenericConfig, SaveOverAFileHeldOpenKeepsItWhole)
     EXPECT_EQ(GenericConfig(path).GetValue<wxString>("key", ""), "new");
     EXPECT_EQ(GenericConfig(path).GetValue<wxString>("other", ""), "value");
 }
+
+TEST(GenericConfig, FileMayLieInAFolderNamedOutsideAscii)
+{
+    const wxString directory = SandboxDir() + wxString::FromUTF8("/Einstellungen für Zoë ✓ 設定");
+    ASSERT_TRUE(wxFileName::Mkdir(directory));
+    const wxString path = directory + wxString::FromUTF8("/Ωmega.json");
+    {
+        GenericConfig config(path);
+        config.SetValue<wxString>("first", "1");
+        config.SetValue<wxString>("second", "2"); // replaces the file saved by the first
+    }
+    GenericConfig reloaded(path);
+    EXPECT_EQ(reloaded.GetValue<wxString>("first", ""), "1");
+    EXPECT_EQ(reloaded.GetValue<wxString>("second", ""), "2");
+    EXPECT_EQ(FilesBeside(path).size(), 1u);
+}

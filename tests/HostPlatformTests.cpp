@@ -155,3 +155,15 @@ TEST(GlobalUtils, UserDataDirCanBeRelocatedByTheEnvironment)
               wxFileName::DirName(relocated + "/dorvannebiconnector").GetFullPath());
     EXPECT_TRUE(wxFileName::DirExists(directory));
 }
+
+// Windows' file APIs take these names only as wide characters, never through
+// an ANSI code page.
+TEST(Logger, LogFileMayBeNamedOutsideAscii)
+{
+    const wxString path = SandboxDir() + wxString::FromUTF8("/Journal Ωmega ✓ 設定 für Zoë.log");
+    ASSERT_TRUE(Logging::SetLogFile(path));
+    SetLevelAndGetLogger(SeverityInfo, "Dir/Source", "Class::Method", 1) << "into the renamed file";
+    ASSERT_TRUE(Logging::SetLogFile(SandboxDir() + "/test.log"));
+    EXPECT_NE(ReadFile(path).find("into the renamed file"), std::string::npos);
+    EXPECT_EQ(CountLogLines("into the renamed file"), 0u);
+}

@@ -16,6 +16,7 @@
 
 #include <Poco/Net/HTTPServerRequest.h>
 #include <Poco/Pipe.h>
+#include <Poco/Exception.h>
 #include <Poco/Process.h>
 #include <Poco/Net/HTTPServerResponse.h>
 #include <gtest/gtest.h>
@@ -69,7 +70,16 @@ ProcessResult RunProcess(const std::string& program, const std::vector<std::stri
     });
     if (output.wait_for(timeout) != std::future_status::ready)
     {
-        Poco::Process::kill(handle);
+        try
+        {
+            // By process id: killing by handle would close the handle on
+            // Windows, after which the process could no longer be waited for.
+            Poco::Process::kill(handle.id());
+        }
+        catch (const Poco::Exception&)
+        {
+            // It ended meanwhile.
+        }
     }
     ProcessResult result;
     result.status = handle.wait();
@@ -119,7 +129,7 @@ TEST(ProcessExit, EndsCleanlyWithJobsInFlight)
     });
 
     // A host that hung at exit would be killed, and fail.
-    const ProcessResult host = RunProcess(EXIT_WITH_JOBS_IN_FLIGHT_PATH,
+    const ProcessResult host = RunProcess(HelperProgram("exit_with_jobs_in_flight").utf8_string(),
                                           {std::to_string(agent.Port()), std::to_string(cloud.Port()),
                                            TestAuthorityFile().utf8_string()},
                                           std::chrono::seconds(60));

@@ -4,31 +4,31 @@
 #include "ResourceStore.h"
 #include "StopRequest.h"
 
-#include <Poco/AutoPtr.h>
-#include <Poco/ConsoleChannel.h>
-#include <Poco/FormattingChannel.h>
 #include <Poco/Net/HTTPServer.h>
 #include <Poco/Net/HTTPServerParams.h>
 #include <Poco/Net/SecureServerSocket.h>
 #include <Poco/Net/SocketAddress.h>
 #include <Poco/NumberParser.h>
 #include <Poco/Path.h>
-#include <Poco/PatternFormatter.h>
-#include <Poco/Util/HelpFormatter.h>
 #include <Poco/Util/IntValidator.h>
 #include <Poco/Util/OptionException.h>
 #include <Poco/Util/OptionSet.h>
 
-#include <csignal>
-#include <iostream>
 #include <memory>
 
 using Poco::Util::Option;
 
+CloudApplication::CloudApplication()
+    : StandInApplication("A stand-in of the cloud's REST interface: keeps uploaded settings archives in a directory "
+                         "and serves them over HTTPS on 127.0.0.1. At first start it makes its own certificate "
+                         "authority and a certificate for localhost and 127.0.0.1; hosts trust the authority's "
+                         "certificate, whose path it prints.")
+{
+}
+
 void CloudApplication::defineOptions(Poco::Util::OptionSet& options)
 {
-    Application::defineOptions(options);
-    options.addOption(Option("help", "h", "Print this help and exit."));
+    StandInApplication::defineOptions(options);
     options.addOption(Option("port", "p", "TCP port on 127.0.0.1 (default 8443; 0 picks a free one).")
                           .argument("PORT")
                           .validator(new Poco::Util::IntValidator(0, 65535)));
@@ -48,13 +48,8 @@ void CloudApplication::defineOptions(Poco::Util::OptionSet& options)
 
 void CloudApplication::handleOption(const std::string& name, const std::string& value)
 {
-    Application::handleOption(name, value);
-    if (name == "help")
-    {
-        m_helpRequested = true;
-        stopOptionsProcessing();
-    }
-    else if (name == "port")
+    StandInApplication::handleOption(name, value);
+    if (name == "port")
     {
         m_port = static_cast<unsigned short>(Poco::NumberParser::parseUnsigned(value));
     }
@@ -84,47 +79,15 @@ void CloudApplication::handleOption(const std::string& name, const std::string& 
     }
 }
 
-void CloudApplication::PrintHelp()
+int CloudApplication::Serve()
 {
-    Poco::Util::HelpFormatter help(options());
-    help.setCommand(commandName());
-    help.setUnixStyle(true); // --option, as on the command line (POCO's Windows default is /option)
-    help.setUsage("[OPTIONS]");
-    help.setHeader("A stand-in of the cloud's REST interface: keeps uploaded settings archives in a directory "
-                   "and serves them over HTTPS on 127.0.0.1. At first start it makes its own certificate "
-                   "authority and a certificate for localhost and 127.0.0.1; hosts trust the authority's "
-                   "certificate, whose path it prints.");
-    help.setFooter("Stop it with Ctrl+C.");
-    help.format(std::cout);
-}
-
-void CloudApplication::UseConsoleLogger()
-{
-    Poco::AutoPtr<Poco::ConsoleChannel> console(new Poco::ConsoleChannel(std::cout));
-    Poco::AutoPtr<Poco::PatternFormatter> format(new Poco::PatternFormatter("%L%H:%M:%S.%i %t"));
-    logger().setChannel(new Poco::FormattingChannel(format, console));
-}
-
-int CloudApplication::main(const std::vector<std::string>& args)
-{
-    if (m_helpRequested)
-    {
-        PrintHelp();
-        return EXIT_OK;
-    }
-    if (!args.empty())
-    {
-        std::cerr << commandName() << ": unexpected argument \"" << args.front() << "\" (see --help)" << std::endl;
-        return EXIT_USAGE;
-    }
-    UseConsoleLogger();
     Poco::Net::initializeSSL();
-    const int status = Serve();
+    const int status = ServeOverHttps();
     Poco::Net::uninitializeSSL();
     return status;
 }
 
-int CloudApplication::Serve()
+int CloudApplication::ServeOverHttps()
 {
     const std::string dataDir = Poco::Path(m_dataDir).makeAbsolute().makeDirectory().toString();
     std::unique_ptr<ResourceStore> store;

@@ -6,22 +6,21 @@
 // SIGTERM), with one console line per request.
 
 #include "CloudRequestHandler.h"
+#include "StandInApplication.h"
 
-#include <Poco/Util/Application.h>
-
-class CloudApplication : public Poco::Util::Application
+class CloudApplication : public StandInApplication
 {
+public:
+    CloudApplication();
+
 protected:
     void defineOptions(Poco::Util::OptionSet& options) override;
     void handleOption(const std::string& name, const std::string& value) override;
-    int main(const std::vector<std::string>& args) override;
+    int Serve() override;
 
 private:
-    void PrintHelp();
-    void UseConsoleLogger();
-    int Serve();
+    int ServeOverHttps();
 
-    bool m_helpRequested = false;
     unsigned short m_port = 8443;
     std::string m_dataDir = "nebi-cloud-data";
     CloudSettings m_settings;

@@ -4,28 +4,25 @@
 #include "StopRequest.h"
 #include "ServicesCatalogue.h"
 
-#include <Poco/AutoPtr.h>
-#include <Poco/ConsoleChannel.h>
-#include <Poco/FormattingChannel.h>
 #include <Poco/Net/HTTPServer.h>
 #include <Poco/Net/HTTPServerParams.h>
 #include <Poco/Net/ServerSocket.h>
 #include <Poco/Net/SocketAddress.h>
 #include <Poco/NumberParser.h>
-#include <Poco/PatternFormatter.h>
-#include <Poco/Util/HelpFormatter.h>
 #include <Poco/Util/IntValidator.h>
 #include <Poco/Util/OptionSet.h>
 
-#include <csignal>
-#include <iostream>
-
 using Poco::Util::Option;
+
+AgentApplication::AgentApplication()
+    : StandInApplication("A stand-in of the local agent: serves the agent's endpoints below /api/v1 over plain HTTP "
+                         "on 127.0.0.1, for one user whose sign-in the login, sign-up and logout pages change.")
+{
+}
 
 void AgentApplication::defineOptions(Poco::Util::OptionSet& options)
 {
-    Application::defineOptions(options);
-    options.addOption(Option("help", "h", "Print this help and exit."));
+    StandInApplication::defineOptions(options);
     options.addOption(Option("port", "p", "TCP port on 127.0.0.1 (default 7285; 0 picks a free one).")
                           .argument("PORT")
                           .validator(new Poco::Util::IntValidator(0, 65535)));
@@ -43,13 +40,8 @@ void AgentApplication::defineOptions(Poco::Util::OptionSet& options)
 
 void AgentApplication::handleOption(const std::string& name, const std::string& value)
 {
-    Application::handleOption(name, value);
-    if (name == "help")
-    {
-        m_helpRequested = true;
-        stopOptionsProcessing();
-    }
-    else if (name == "port")
+    StandInApplication::handleOption(name, value);
+    if (name == "port")
     {
         m_port = static_cast<unsigned short>(Poco::NumberParser::parseUnsigned(value));
     }
@@ -83,39 +75,8 @@ void AgentApplication::handleOption(const std::string& name, const std::string& 
     }
 }
 
-void AgentApplication::PrintHelp()
+int AgentApplication::Serve()
 {
-    Poco::Util::HelpFormatter help(options());
-    help.setCommand(commandName());
-    help.setUnixStyle(true); // --option, as on the command line (POCO's Windows default is /option)
-    help.setUsage("[OPTIONS]");
-    help.setHeader("A stand-in of the local agent: serves the agent's endpoints below /api/v1 over plain HTTP "
-                   "on 127.0.0.1, for one user whose sign-in the login, sign-up and logout pages change.");
-    help.setFooter("Stop it with Ctrl+C.");
-    help.format(std::cout);
-}
-
-void AgentApplication::UseConsoleLogger()
-{
-    Poco::AutoPtr<Poco::ConsoleChannel> console(new Poco::ConsoleChannel(std::cout));
-    Poco::AutoPtr<Poco::PatternFormatter> format(new Poco::PatternFormatter("%L%H:%M:%S.%i %t"));
-    logger().setChannel(new Poco::FormattingChannel(format, console));
-}
-
-int AgentApplication::main(const std::vector<std::string>& args)
-{
-    if (m_helpRequested)
-    {
-        PrintHelp();
-        return EXIT_OK;
-    }
-    if (!args.empty())
-    {
-        std::cerr << commandName() << ": unexpected argument \"" << args.front() << "\" (see --help)" << std::endl;
-        return EXIT_USAGE;
-    }
-    UseConsoleLogger();
-
     Json::Value services;
     Poco::Net::ServerSocket socket;
     try

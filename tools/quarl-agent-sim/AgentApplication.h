@@ -5,21 +5,19 @@
 // SIGTERM), and writes one console line per request.
 
 #include "SignInState.h"
+#include "StandInApplication.h"
 
-#include <Poco/Util/Application.h>
-
-class AgentApplication : public Poco::Util::Application
+class AgentApplication : public StandInApplication
 {
+public:
+    AgentApplication();
+
 protected:
     void defineOptions(Poco::Util::OptionSet& options) override;
     void handleOption(const std::string& name, const std::string& value) override;
-    int main(const std::vector<std::string>& args) override;
+    int Serve() override;
 
 private:
-    void PrintHelp();
-    void UseConsoleLogger();
-
-    bool m_helpRequested = false;
     unsigned short m_port = 7285;
     bool m_signedIn = true;
     std::string m_servicesFile;

@@ -140,6 +140,19 @@ protected:
         return result.substr(result.find(' ') + 1); // without the request id
     }
 
+    // A backup, a restore, a list and a delete, each of which must end in its
+    // failure signal.
+    void ExpectEveryOperationToFail()
+    {
+        m_backup->BackupToPrivateSpace(Archive(), false);
+        const wxString restoreId = m_backup->RestoreFromPrivateSpace();
+        EXPECT_TRUE(Listed().empty());
+        EXPECT_EQ(Deleted(m_backup->Delete("public", "r-1")), "r-1 false");
+        ASSERT_TRUE(WaitForBackupEnd());
+        EXPECT_EQ(m_backupStatuses.back().error, BackupRestoreComponent::Failed);
+        EXPECT_EQ(Restored(restoreId).error, BackupRestoreComponent::Failed);
+    }
+
     wxString Archive(const std::string& content = "PK\x03\x04 settings")
     {
         const wxString path = SandboxDir() + "/settings-" + GlobalUtils::GetUUID().Left(4) + ".zip";
@@ -446,27 +459,14 @@ TEST_F(Backups, RequestsWithoutCredentialsStillGoOut)
 TEST_F(Backups, BrokenSettingsOrCredentialsEndInFailureSignals)
 {
     Start(SignedInRecord("Ada", "ada@example.com", "admin", "KEY", "S\\r\\nX-Injected: yes"));
-    const wxString archive = Archive();
-    m_backup->BackupToPrivateSpace(archive, false);
-    const wxString restoreId = m_backup->RestoreFromPrivateSpace();
-    EXPECT_TRUE(Listed().empty());
-    EXPECT_EQ(Deleted(m_backup->Delete("public", "r-1")), "r-1 false");
-    ASSERT_TRUE(WaitForBackupEnd());
-    EXPECT_EQ(m_backupStatuses.back().error, BackupRestoreComponent::Failed);
-    EXPECT_EQ(Restored(restoreId).error, BackupRestoreComponent::Failed);
+    ExpectEveryOperationToFail();
     EXPECT_TRUE(m_cloud.Requests().empty()) << "a header with a line break in a credential went out";
 }
 
 TEST_F(Backups, ABasePathThatIsNoUriPathEndsInFailureSignals)
 {
     Start(SignedInRecord(), ", \"nebiclientappapiversion\": \"/api%zz\"");
-    m_backup->BackupToPrivateSpace(Archive(), false);
-    const wxString restoreId = m_backup->RestoreFromPrivateSpace();
-    EXPECT_TRUE(Listed().empty());
-    EXPECT_EQ(Deleted(m_backup->Delete("public", "r-1")), "r-1 false");
-    ASSERT_TRUE(WaitForBackupEnd());
-    EXPECT_EQ(m_backupStatuses.back().error, BackupRestoreComponent::Failed);
-    EXPECT_EQ(Restored(restoreId).error, BackupRestoreComponent::Failed);
+    ExpectEveryOperationToFail();
 }
 
 TEST_F(Backups, StoredTimeIsReadUntilCachedAndClearedByALogout)
